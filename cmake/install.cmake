@@ -1,0 +1,23 @@
+# What `cmake --install` puts where: headers, libraries, pkg-config file, CMake package, command, manual page, catalogue.
+include(CMakePackageConfigHelpers)
+
+install(FILES include/qn.h include/qn_cu.h include/qn_ffdc.h include/cu_tr_proxy.h include/qn_tr.h
+        DESTINATION ${CMAKE_INSTALL_INCLUDEDIR})
+install(TARGETS qn_tr qn_cu qn_ffdc EXPORT qn_tr_targets LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
+install(TARGETS qntrace RUNTIME DESTINATION ${CMAKE_INSTALL_BINDIR})
+install(FILES tools/qntrace/qntrace.1 DESTINATION ${CMAKE_INSTALL_MANDIR}/man1)
+
+# Where catopen() looks without NLSPATH, for the locales whose language the texts are in.
+foreach(locale C en)
+    install(FILES ${QN_TR_CATALOGUE} DESTINATION ${CMAKE_INSTALL_DATADIR}/locale/${locale}/LC_MESSAGES)
+endforeach()
+
+configure_file(cmake/qn_tr.pc.in qn_tr.pc @ONLY)
+install(FILES ${CMAKE_CURRENT_BINARY_DIR}/qn_tr.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
+
+set(package_dir ${CMAKE_INSTALL_LIBDIR}/cmake/qn_tr)
+configure_package_config_file(cmake/qn_trConfig.cmake.in qn_trConfig.cmake INSTALL_DESTINATION ${package_dir})
+write_basic_package_version_file(qn_trConfigVersion.cmake COMPATIBILITY SameMajorVersion)
+install(FILES ${CMAKE_CURRENT_BINARY_DIR}/qn_trConfig.cmake ${CMAKE_CURRENT_BINARY_DIR}/qn_trConfigVersion.cmake
+        DESTINATION ${package_dir})
+install(EXPORT qn_tr_targets NAMESPACE qn_tr:: DESTINATION ${package_dir})

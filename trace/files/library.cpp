@@ -1,0 +1,109 @@
+// Lazy initialisation from the environment, the fork handler and the stop switch. Global mutex, held by init's caller.
+#include "trace/files/library.h"
+
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <sys/syslog.h>
+#include <unistd.h>
+
+#include <cu_tr_proxy.h>
+
+#include "trace/components/specifications.h"
+#include "trace/files/debug.h"
+#include "trace/files/locks.h"
+#include "trace/spooling/spool.h"
+
+int global_switch = 0;
+int this_is_child = 0;
+int use_msync_enabled_except_flush = 0;
+pthread_once_t register_once = PTHREAD_ONCE_INIT;
+pthread_once_t sp_read_cfg = PTHREAD_ONCE_INIT;
+
+namespace
+{
+using namespace qn::tr;
+
+// The value of an environment variable, or null when it is unset or empty.
+const char *environment(const char *name)
+{
+    const char *value = std::getenv(name);
+    return value != nullptr && value[0] != '\0' ? value : nullptr;
+}
+
+void name_default_file(trace_anchor_t *anchor, const char *name)
+{
+    if (name[0] == '/') {
+        set_file_name(anchor, name);
+        return;
+    }
+    char directory[trace_file_name_bytes];
+    if (getcwd(directory, sizeof directory) == nullptr) directory[0] = '\0';
+    const size_t length = std::strlen(directory);
+    const char *separator = length > 0 && directory[length - 1] == '/' ? "" : "/";
+    // Cut to the field, like every file name.
+    const int written =
+        std::snprintf(anchor->fileName, sizeof anchor->fileName, "%s%s%s", directory, separator, name);
+    (void)written;
+}
+
+void size_default_file(trace_anchor_t *anchor, const char *value)
+{
+    const auto size = static_cast<qn_uint32_t>(std::strtoul(value, nullptr, 0));
+    if (std::strtoul(value, nullptr, 0) != 0) anchor->uRequestedFileSize = size;
+}
+
+tr_proxy_func_table_t _trp_funcs = {tr_flush_1, tr_record_vfmt_string_1};
+} // namespace
+
+int init(trace_anchor_t *anchor)
+{
+    if (anchor == &anchors)
+        anchor->pageSize = static_cast<qn_int32_t>(sysconf(_SC_PAGESIZE));
+    else
+        initAnchor(anchor);
+    pthread_once(&register_once, register_atfork);
+
+    const char *value = std::getenv("QN_TR_USE_MSYNC");
+    if (value != nullptr) use_msync_enabled_except_flush = std::atoi(value) != 0;
+    value = environment("QN_TR_FILENAME");
+    if (value != nullptr) name_default_file(anchor, value);
+    value = environment("QN_TR_SIZE");
+    if (value != nullptr) size_default_file(anchor, value);
+    value = environment("QN_TR_DEBUG_LEVEL");
+    if (value != nullptr)
+        store_relaxed(global_debug_level, static_cast<qn_uint32_t>(std::strtoul(value, nullptr, 0)));
+    if (debug_level_above(0)) openlog("opal_trace", LOG_CONS | LOG_NDELAY | LOG_PID, LOG_DAEMON);
+
+    value = environment("QN_TR_TRACE_LEVELS");
+    if (value != nullptr) parse_trace_spec(value, &anchor->pFirstTraceSpec, &anchor->pLastTraceSpec);
+    value = environment("QN_TR_FILE_MAP");
+    if (value != nullptr) parse_map_spec(value, &anchor->pFirstMapSpec, &anchor->pLastMapSpec);
+    value = environment("QN_TR_FILE_SIZE");
+    if (value != nullptr) parse_fileSize_spec(value);
+
+    pthread_once(&sp_read_cfg, read_spool_cfg);
+    determine_configuration_action_from_the_configuration_file();
+    std::atexit(tr_term);
+    cu_trp_register(&_trp_funcs);
+    anchor->bInitialized = 1;
+    return 0;
+}
+
+int master_override_off(void) { return load_relaxed(global_switch); }
+
+void global_stop_trace(void) { store_relaxed(global_switch, 1); }
+
+void register_atfork(void) { pthread_atfork(nullptr, nullptr, atfork_child); }
+
+void atfork_child(void)
+{
+    store_relaxed(this_is_child, 1);
+    global_stop_trace();
+    reset_locks_in_child();
+}
+
+namespace qn::tr
+{
+int init_default_anchor() { return anchors.bInitialized ? 0 : init(&anchors); }
+} // namespace qn::tr

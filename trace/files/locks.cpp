@@ -1,0 +1,48 @@
+// The mutexes themselves, and the calls on them that are used by name.
+#include "trace/files/locks.h"
+
+pthread_mutex_t anchor_list_mutex;
+pthread_mutex_t component_list_mutex = PTHREAD_RECURSIVE_MUTEX_INITIALIZER_NP;
+pthread_mutex_t configuration_file_last_modified_mutex;
+
+void init_recursive_mutex(pthread_mutex_t *mutex)
+{
+    pthread_mutexattr_t attributes;
+    pthread_mutexattr_init(&attributes);
+    pthread_mutexattr_settype(&attributes, PTHREAD_MUTEX_RECURSIVE);
+    pthread_mutex_init(mutex, &attributes);
+    pthread_mutexattr_destroy(&attributes);
+}
+
+int lockGlobalMutex(void) { return pthread_mutex_lock(&anchors.anchorMutex); }
+
+int unlockGlobalMutex(void) { return pthread_mutex_unlock(&anchors.anchorMutex); }
+
+void mutex_cleanup(void *mutex) { pthread_mutex_unlock(static_cast<pthread_mutex_t *>(mutex)); }
+
+int lock_anchor_set(trace_anchor_t *anchor)
+{
+    pthread_mutex_t *taken = nullptr;
+    return qn::tr::take_anchor_set(anchor, taken);
+}
+
+int unlock_anchor_set(trace_anchor_t *anchor) { return pthread_mutex_unlock(qn::tr::anchor_set_mutex(anchor)); }
+
+void cleanup_anchor_set(void *anchor) { unlock_anchor_set(static_cast<trace_anchor_t *>(anchor)); }
+
+namespace qn::tr
+{
+void reset_locks_in_child()
+{
+    initialize_trace_global_data();
+    init_recursive_mutex(&anchors.anchorMutex);
+    init_recursive_mutex(&component_list_mutex);
+    pthread_cond_init(&spq.cond, nullptr);
+    for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = anchor->next) {
+        if (anchor->pSpoolMutex != nullptr) init_recursive_mutex(anchor->pSpoolMutex);
+        for_each_page(anchor, [](trace_anchor_t *page) {
+            if (page != &anchors) init_recursive_mutex(&page->anchorMutex);
+        });
+    }
+}
+} // namespace qn::tr

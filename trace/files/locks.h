@@ -1,0 +1,112 @@
+// The library's locks and the guards that hold them.
+//
+// Order, from first to last; a thread takes a lock only while it holds none that comes later:
+//   1 global mutex            anchors.anchorMutex: components, specifications, starting and stopping of traces
+//   2 anchor set lock         one per trace file or page set: the mapping and the ring
+//   3 a page's anchorMutex    one page of a set, while it is reset or copied
+//   4 spool queue mutex       the queue of full pages, and unmapping
+//   leaves, under which no other lock is taken:
+//     anchor list mutex       insertion into the list of trace files
+//     component list mutex    the links of the component list, for the look-ups that hold no global mutex
+//     configuration_file_last_modified_mutex
+//
+// All of them are recursive. A guard releases its lock when it goes out of scope, also when the thread is cancelled:
+// cancellation unwinds the stack like an exception. So nothing between a guard and a cancellation point may be noexcept.
+#pragma once
+
+#include <pthread.h>
+
+#include "trace/files/anchor.h"
+#include "trace/files/shared_words.h"
+#include "trace/spooling/spool_types.h"
+
+// Makes a recursive mutex.
+void init_recursive_mutex(pthread_mutex_t *mutex);
+
+// The global mutex; the lock's result, 0 on success.
+int lockGlobalMutex(void);
+int unlockGlobalMutex(void);
+
+// Unlocks a mutex; what a cancelled holder runs.
+void mutex_cleanup(void *mutex);
+
+// The lock of the page set that the anchor belongs to, or of its single file; the lock's result, 0 on success.
+int lock_anchor_set(trace_anchor_t *anchor);
+int unlock_anchor_set(trace_anchor_t *anchor);
+
+// Unlocks the anchor's set; what a cancelled holder runs.
+void cleanup_anchor_set(void *anchor);
+
+extern pthread_mutex_t anchor_list_mutex;
+extern pthread_mutex_t component_list_mutex;
+extern pthread_mutex_t configuration_file_last_modified_mutex;
+
+namespace qn::tr
+{
+// Holds a plain mutex. Test it: a lock that could not be taken is not released.
+class mutex_lock
+{
+public:
+    explicit mutex_lock(pthread_mutex_t &mutex) : mutex_(&mutex), result_(pthread_mutex_lock(&mutex)) {}
+    mutex_lock(const mutex_lock &) = delete;
+    mutex_lock &operator=(const mutex_lock &) = delete;
+    ~mutex_lock()
+    {
+        if (result_ == 0) mutex_cleanup(mutex_);
+    }
+    explicit operator bool() const { return result_ == 0; }
+    int result() const { return result_; }
+
+private:
+    pthread_mutex_t *mutex_;
+    int result_;
+};
+
+// Holds the global mutex.
+class global_lock : public mutex_lock
+{
+public:
+    global_lock() : mutex_lock(anchors.anchorMutex) {}
+};
+
+// The mutex that is the anchor's set lock right now.
+inline pthread_mutex_t *anchor_set_mutex(trace_anchor_t *anchor)
+{
+    pthread_mutex_t *shared = load_acquire(anchor->pSpoolMutex);
+    return shared != nullptr && load_relaxed(anchor->spool) != nullptr ? shared : &anchor->anchorMutex;
+}
+
+// Takes the anchor set lock and tells which mutex that was; the lock's result. A start may turn a single file into a
+// page set, whose lock is another one, while a thread waits: so it looks again when it has the mutex.
+inline int take_anchor_set(trace_anchor_t *anchor, pthread_mutex_t *&taken)
+{
+    for (;;) {
+        taken = anchor_set_mutex(anchor);
+        const int result = pthread_mutex_lock(taken);
+        if (__builtin_expect(result != 0 || taken == anchor_set_mutex(anchor), 1)) return result;
+        pthread_mutex_unlock(taken);
+    }
+}
+
+// Holds an anchor set lock. It releases the mutex that it took, whatever a start made of the anchor meanwhile.
+class anchor_set_lock
+{
+public:
+    explicit anchor_set_lock(trace_anchor_t *anchor) : result_(take_anchor_set(anchor, mutex_)) {}
+    anchor_set_lock(const anchor_set_lock &) = delete;
+    anchor_set_lock &operator=(const anchor_set_lock &) = delete;
+    ~anchor_set_lock()
+    {
+        if (result_ == 0) pthread_mutex_unlock(mutex_);
+    }
+    explicit operator bool() const { return result_ == 0; }
+    int result() const { return result_; }
+
+private:
+    pthread_mutex_t *mutex_ = nullptr;
+    int result_;
+};
+
+// Makes every lock free again in a forked child, where the threads that held them do not exist.
+void reset_locks_in_child();
+} // namespace qn::tr

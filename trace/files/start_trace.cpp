@@ -1,0 +1,191 @@
+// Starting a trace as a whole: the page set when there is one, then its pages, then its start record.
+//
+// Anchor set lock, held by the caller; the ..._locked forms take it.
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <string_view>
+
+#include "trace/components/component.h"
+#include "trace/files/debug.h"
+#include "trace/files/error_report.h"
+#include "trace/files/library.h"
+#include "trace/files/locks.h"
+#include "trace/files/trace_file.h"
+#include "trace/recording/recording.h"
+#include "trace/spooling/spool.h"
+
+namespace
+{
+using namespace qn::tr;
+
+// Bytes that "." and a page number and ".sp" may add to a trace's name.
+constexpr size_t page_suffix_bytes = sizeof ".4294967295.sp";
+
+// A page's name given back as a trace's name: cut at the second dot from its end.
+void cut_page_suffix(char *name)
+{
+    const std::string_view text(name);
+    const size_t suffix = text.find(".sp");
+    if (suffix == std::string_view::npos || suffix + 3 != text.size()) return;
+    int dots = 0;
+    for (size_t i = text.size() - 1; i > 0; --i) {
+        if (name[i] != '.' || ++dots < 2) continue;
+        name[i] = '\0';
+        return;
+    }
+}
+
+// The expression is the interface: other programs reckon with its results.
+qn_uint32_t round_page_size(qn_uint32_t bytes, qn_int32_t memory_page)
+{
+    const auto page = static_cast<qn_uint32_t>(memory_page);
+    return (bytes + page) & ~page;
+}
+
+pthread_mutex_t *new_recursive_mutex()
+{
+    auto *mutex = static_cast<pthread_mutex_t *>(std::malloc(sizeof(pthread_mutex_t)));
+    if (mutex != nullptr) init_recursive_mutex(mutex);
+    return mutex;
+}
+
+// Makes the anchor the head of a ring of `pages` page anchors.
+qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
+{
+    trace_spool_spec_t *spool = head->spool;
+    const qn_uint32_t page_size = spool->pg_size != 0 ? spool->pg_size : head->uRequestedFileSize / pages;
+    head->uRequestedFileSize = round_page_size(page_size, head->pageSize);
+    spool->pg_size = head->uRequestedFileSize;
+
+    char base_name[trace_file_name_bytes];
+    std::memcpy(base_name, head->fileName, sizeof base_name);
+    cut_page_suffix(base_name);
+    if (std::strlen(base_name) + page_suffix_bytes > sizeof head->fileName)
+        return set_error_str(QN_TR_EFILENAME, 17, head->fileName);
+
+    // A set taken apart leaves its mutex behind, in case a thread still waits for it.
+    pthread_mutex_t *shared = head->pSpoolMutex != nullptr ? head->pSpoolMutex : new_recursive_mutex();
+    if (shared == nullptr) return set_error(QN_TR_ENOMEM, 14);
+    const size_t room = sizeof head->fileName;
+    std::snprintf(head->fileName, room, "%.*s.1.sp", static_cast<int>(room - page_suffix_bytes), base_name);
+    debug("creating page '%s'\n", head->fileName);
+    store_relaxed(head->nextPage, head);
+    head->pActivePg = head;
+    head->ppActivePg = &head->pActivePg;
+    head->p_head_spool_anchor = head;
+    store_release(head->pSpoolMutex, shared);
+
+    trace_anchor_t *last = head;
+    for (qn_uint32_t number = 2; number <= pages; ++number) {
+        char page_name[trace_file_name_bytes];
+        std::snprintf(page_name, sizeof page_name, "%.*s.%u.sp", static_cast<int>(room - page_suffix_bytes), base_name,
+                      number);
+        debug("creating page anchor '%s'\n", page_name);
+        trace_anchor_t *page = getSplAnchor(head, page_name);
+        if (page == nullptr) return -1;
+        page->nextPage = head;
+        last->nextPage = page;
+        last = page;
+    }
+    return 0;
+}
+
+void start_if_on(trace_anchor_t *anchor, qn_int32_t &status)
+{
+    const anchor_set_lock set(anchor);
+    if (!set)
+        status = set_error_int(QN_TR_ELOCK, 9, set.result());
+    else if (anchor->pMap == nullptr && is_trace_on(anchor))
+        status = start_trace(anchor);
+}
+
+qn_int32_t start_pages(trace_anchor_t *anchor)
+{
+    qn_int32_t status = 0;
+    for_each_page(anchor, [&](trace_anchor_t *page) {
+        if (status == 0) status = start_trace_page(page);
+    });
+    return status;
+}
+} // namespace
+
+qn_int32_t start_trace(trace_anchor_t *anchor)
+{
+    pthread_once(&trace_global_data_once, initialize_trace_global_data);
+    if (load_relaxed(this_is_child) != 0) return 0; // the parent may be writing the file
+
+    const bool may_have_pages = anchors.pFirstSpoolSpec != nullptr || anchors.bMultipageEnabled == 1;
+    if (anchor->nextPage == nullptr && anchor->pMap == nullptr && may_have_pages) {
+        process_spool_spec(anchor, anchors.pFirstSpoolSpec);
+        if (spooling_is_on(anchor) && anchor->spool->pages != 0) {
+            const qn_int32_t status = make_page_set(anchor, anchor->spool->pages);
+            if (status != 0) return status;
+        }
+    }
+
+    const qn_int32_t status = start_pages(anchor);
+    if (status != 0) return status;
+    if (spooling_is_on(anchor) && anchor->ppActivePg != nullptr) int_record_start(*anchor->ppActivePg);
+    // Only this trace's pages: the walk over all traces takes the global mutex, which comes before the anchor set lock.
+    if (load_relaxed(memory_is_pinned) != 0 && !master_override_off()) touch_trace(anchor);
+    return 0;
+}
+
+qn_int32_t trace_reinit(trace_anchor_t *anchor)
+{
+    char file_name[trace_file_name_bytes];
+    char saved_name[trace_file_name_bytes];
+    std::memcpy(file_name, anchor->fileName, sizeof file_name);
+
+    if (is_trace_on(anchor)) stop_trace(anchor, 0);
+    const int length = std::snprintf(saved_name, sizeof saved_name, "%s.save", file_name);
+    if (length < trace_file_name_bytes) std::rename(file_name, saved_name);
+    return start_trace(anchor);
+}
+
+int is_trace_on(trace_anchor_t *anchor)
+{
+    return anchor->fileName[0] != '\0' && any_category_traces() ? 1 : 0;
+}
+
+namespace qn::tr
+{
+qn_int32_t start_trace_locked(trace_anchor_t *anchor)
+{
+    const anchor_set_lock set(anchor);
+    if (!set) return set_error_int(QN_TR_ELOCK, 9, set.result());
+    return start_trace(anchor);
+}
+
+qn_int32_t start_traces_that_are_on()
+{
+    qn_int32_t status = 0;
+    for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = load_acquire(anchor->next))
+        start_if_on(anchor, status);
+    return status;
+}
+
+void take_page_set_apart(trace_anchor_t *anchor)
+{
+    const anchor_set_lock set(anchor);
+    if (anchor->nextPage == nullptr) return;
+    stop_trace(anchor, load_relaxed(this_is_child));
+    for (trace_anchor_t *page = anchor->nextPage; page != nullptr && page != anchor;) {
+        trace_anchor_t *following = page->nextPage;
+        if (page->p_head_spool_anchor == anchor) {
+            pthread_mutex_destroy(&page->anchorMutex);
+            std::free(page);
+        } else {
+            store_relaxed(page->nextPage, nullptr); // a trace file of its own that had a page's name
+        }
+        page = following;
+    }
+    store_relaxed(anchor->nextPage, nullptr);
+    anchor->pActivePg = nullptr;
+    anchor->ppActivePg = nullptr;
+    anchor->p_head_spool_anchor = nullptr;
+    anchor->bSpoolProcessed = 0;
+    store_relaxed(anchor->spool, nullptr);
+}
+} // namespace qn::tr

@@ -1,0 +1,110 @@
+// Stopping trace files, and the end of all tracing.
+#include <cstdlib>
+#include <sys/mman.h>
+#include <unistd.h>
+
+#include "trace/components/component.h"
+#include "trace/components/specifications.h"
+#include "trace/files/debug.h"
+#include "trace/files/error_report.h"
+#include "trace/files/library.h"
+#include "trace/files/locks.h"
+#include "trace/files/trace_file.h"
+#include "trace/spooling/spool.h"
+
+namespace
+{
+using namespace qn::tr;
+
+// Frees a list and clears its ends.
+template <class Node>
+void free_list(Node *&first, Node *&last)
+{
+    while (first != nullptr) {
+        Node *next = first->pNext;
+        std::free(first);
+        first = next;
+    }
+    last = nullptr;
+}
+
+void free_components(trace_anchor_t *anchor)
+{
+    const mutex_lock list(component_list_mutex);
+    while (anchor->pFirstComp != nullptr) {
+        component_anchor_t *component = anchor->pFirstComp;
+        anchor->pFirstComp = component->pNext;
+        free_component(component);
+    }
+}
+
+// Lets the spool thread come to its end: at most 2 s.
+void wait_for_spool_thread()
+{
+    constexpr int most_waits = 100;
+    constexpr useconds_t wait_us = 20000;
+    pthread_cond_signal(&spq.cond);
+    for (int waits = 0; waits < most_waits && load_acquire(is_spool_running) != 0; ++waits) usleep(wait_us);
+}
+} // namespace
+
+qn_int32_t stop_trace_page(trace_anchor_t *anchor, int child)
+{
+    debug("**@ stop_trace_page enter for %s\n", anchor->fileName);
+    if (anchor->pMap == nullptr) return 0;
+    if (!child) {
+        store_relaxed(header_of(anchor)->uFlags, 0);
+        debug("**@ stop_trace_page - msync(MS_SYNC) for %s\n", anchor->fileName);
+        msync(anchor->pMap, anchor->uActualFileSize, MS_SYNC);
+    }
+    const mutex_lock queue(spq.mutex);
+    spool_dequeue_and_delete_element(&spq, anchor);
+    unmap_page(anchor);
+    return 0;
+}
+
+qn_int32_t stop_trace(trace_anchor_t *anchor, int child)
+{
+    debug("*** stop_trace for %s", anchor->fileName);
+    qn_int32_t status = 0;
+    for_each_page(anchor, [&](trace_anchor_t *page) {
+        if (status == 0) status = stop_trace_page(page, child);
+    });
+    return status;
+}
+
+void tr_term_file_anchor(trace_anchor_t *anchor)
+{
+    stop_trace(anchor, 0);
+    free_components(anchor);
+    free_list(anchor->pFirstTraceSpec, anchor->pLastTraceSpec);
+    free_list(anchor->pFirstMapSpec, anchor->pLastMapSpec);
+    anchor->fileName[0] = '\0';
+    anchor->bInitialized = 0;
+}
+
+void tr_term(void)
+{
+    global_stop_trace();
+    if (load_relaxed(this_is_child) != 0) return;
+    wait_for_spool_thread();
+
+    const global_lock global;
+    if (!global) return;
+    trace_anchor_t *next = nullptr;
+    for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = next) {
+        next = load_acquire(anchor->next);
+        const anchor_set_lock set(anchor);
+        if (set) tr_term_file_anchor(anchor);
+    }
+}
+
+namespace qn::tr
+{
+qn_int32_t stop_trace_locked(trace_anchor_t *anchor)
+{
+    const anchor_set_lock set(anchor);
+    if (!set) return set_error_int(QN_TR_ELOCK, 9, set.result());
+    return stop_trace(anchor, load_relaxed(this_is_child));
+}
+} // namespace qn::tr

@@ -1,0 +1,101 @@
+// Records of data blocks.
+#include <array>
+#include <cstdarg>
+#include <cstring>
+
+#include "trace/recording/record_frame.h"
+
+namespace
+{
+using namespace qn::tr;
+
+constexpr qn_int32_t most_blocks = 128;
+constexpr qn_uint32_t longest_block = 0x100000;
+
+struct data_writer : record_writer {
+    static constexpr auto function = format::kind::data_blocks;
+    using record = trace_record_data_t;
+
+    qn_uint32_t trace_id;
+    qn_int32_t n_blocks; // signed: a count below zero is recorded as it is, with no blocks
+    argument_list arguments;
+    unsigned int record_bytes = sizeof(record);
+    std::array<const void *, most_blocks> blocks;
+    std::array<qn_uint32_t, most_blocks> lengths;
+
+    data_writer(qn_uint32_t id, qn_uint32_t count, argument_list args)
+        : trace_id(id), n_blocks(static_cast<qn_int32_t>(count)), arguments(args)
+    {
+    }
+
+    qn_int32_t check(const trace_anchor_t *) const { return n_blocks > most_blocks ? QN_TR_EBLOCKCOUNT : 0; }
+
+    // Takes the blocks; the first one with which the record no longer fits ends them.
+    qn_int32_t check_locked(const trace_anchor_t *anchor)
+    {
+        for (qn_int32_t i = 0; i < n_blocks; ++i) {
+            const void *block = va_arg(arguments, const void *);
+            const auto length = static_cast<qn_uint32_t>(va_arg(arguments, int));
+            if (block == nullptr) return QN_TR_EBLOCKPTR;
+            if (length > longest_block) return QN_TR_EBLOCKLEN;
+            if (record_bytes + format::block_bytes(length) > anchor->uMaxSize) {
+                n_blocks = i;
+                break;
+            }
+            blocks[i] = block;
+            lengths[i] = length;
+            record_bytes += format::block_bytes(length);
+        }
+        return 0;
+    }
+
+    qn_int32_t size(const trace_anchor_t *, unsigned int &length) const
+    {
+        length = record_bytes;
+        return 0;
+    }
+
+    void fill(trace_record_data_t *to) const
+    {
+        to->trace_id = trace_id;
+        to->n_blocks = static_cast<qn_uint32_t>(n_blocks);
+        unsigned char *place = body_of(to);
+        for (qn_int32_t i = 0; i < n_blocks; ++i) {
+            std::memcpy(place, &lengths[i], sizeof lengths[i]);
+            std::memcpy(place + sizeof lengths[i], blocks[i], lengths[i]);
+            place += format::block_bytes(lengths[i]);
+        }
+    }
+};
+} // namespace
+
+qn_int32_t tr_ms_record_data_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
+                                 qn_uint32_t blkCount, va_list args)
+{
+    data_writer writer(traceId, blkCount, args);
+    return write_record(pCompId, fileToken, writer);
+}
+
+qn_int32_t tr_record_data_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint32_t blkCount, va_list args)
+{
+    return tr_ms_record_data_v_1(pCompId, traceId, nullptr, blkCount, args);
+}
+
+qn_int32_t tr_ms_record_data_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
+                               qn_uint32_t blkCount, ...)
+{
+    va_list args;
+    va_start(args, blkCount);
+    const qn_int32_t status = tr_ms_record_data_v_1(pCompId, traceId, fileToken, blkCount, args);
+    va_end(args);
+    return status;
+}
+
+qn_int32_t tr_record_data_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint32_t blkCount, ...)
+{
+    va_list args;
+    va_start(args, blkCount);
+    const qn_int32_t status = tr_record_data_v_1(pCompId, traceId, blkCount, args);
+    va_end(args);
+    return status;
+}

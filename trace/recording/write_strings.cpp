@@ -1,0 +1,198 @@
+// Strings records: up to 32 strings, or one formatted text.
+#include <algorithm>
+#include <array>
+#include <cstdarg>
+#include <cstdio>
+#include <cstring>
+
+#include "trace/recording/record_frame.h"
+
+namespace
+{
+using namespace qn::tr;
+
+constexpr qn_uint32_t most_strings = 32;
+constexpr qn_uint32_t no_trace_id = 0xFFFFFFFF;
+
+struct strings_writer : record_writer {
+    static constexpr auto function = format::kind::strings;
+    using record = trace_record_strings_t;
+
+    qn_uint32_t id;
+    qn_uint32_t number;
+    argument_list arguments;
+    qn_uint32_t len_strings = 0;
+    std::array<const char *, most_strings> strings;
+    std::array<qn_uint32_t, most_strings> sizes;
+
+    strings_writer(qn_uint32_t trace_id, qn_uint32_t count, argument_list args)
+        : id(trace_id), number(count), arguments(args)
+    {
+    }
+
+    // Takes the strings; the first one with which their running total no longer fits ends them. The trace may be
+    // resized before the lock is taken: then the allocator has the last word.
+    qn_int32_t check(const trace_anchor_t *anchor)
+    {
+        if (number == 0 || number > most_strings) return QN_TR_ESTRCOUNT;
+        const qn_uint32_t longest = load_relaxed(anchor->uMaxSize);
+        for (qn_uint32_t i = 0; i < number; ++i) {
+            const char *string = va_arg(arguments, const char *);
+            if (string == nullptr || string[0] == '\0') return QN_TR_ESTRING;
+            const size_t size = std::strlen(string) + 1;
+            if (len_strings + size > longest) {
+                number = i;
+                break;
+            }
+            strings[i] = string;
+            sizes[i] = static_cast<qn_uint32_t>(size);
+            len_strings += sizes[i];
+        }
+        return 0;
+    }
+
+    qn_int32_t size(const trace_anchor_t *, unsigned int &length) const
+    {
+        length = format::strings_record_bytes(len_strings);
+        return 0;
+    }
+
+    void fill(trace_record_strings_t *to) const
+    {
+        to->id = id;
+        to->number = number;
+        to->len_strings = len_strings;
+        unsigned char *place = body_of(to);
+        for (qn_uint32_t i = 0; i < number; place += sizes[i++]) std::memcpy(place, strings[i], sizes[i]);
+    }
+};
+
+// The text is made in the anchor's buffer, under the lock.
+struct formatted_writer : record_writer {
+    static constexpr auto function = format::kind::strings;
+    using record = trace_record_strings_t;
+
+    qn_uint32_t id;
+    const char *format;
+    argument_list arguments;
+    const char *text = nullptr;
+    qn_uint32_t text_size = 0; // with its terminator
+
+    formatted_writer(qn_uint32_t trace_id, const char *text_format, argument_list args)
+        : id(trace_id), format(text_format), arguments(args)
+    {
+    }
+
+    qn_int32_t check(const trace_anchor_t *) const
+    {
+        return format == nullptr || format[0] == '\0' ? QN_TR_ENOFORMAT : 0;
+    }
+
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral" // the exported calls check the client's format
+    qn_int32_t size(trace_anchor_t *anchor, unsigned int &length)
+    {
+        if (std::vsnprintf(anchor->buffer, sizeof anchor->buffer, format, arguments) < 0) return QN_TR_EFORMAT;
+        text = anchor->buffer;
+        text_size = static_cast<qn_uint32_t>(std::strlen(text)) + 1;
+        length = format::strings_record_bytes(text_size);
+        if (length > anchor->uMaxSize) {
+            length = anchor->uMaxSize;
+            text_size = anchor->uMaxSize - static_cast<qn_uint32_t>(sizeof(record));
+        }
+        return 0;
+    }
+#pragma GCC diagnostic pop
+
+    void fill(trace_record_strings_t *to) const
+    {
+        to->id = id;
+        to->number = 1;
+        to->len_strings = text_size;
+        std::memcpy(body_of(to), text, text_size - 1);
+        body_of(to)[text_size - 1] = '\0';
+    }
+};
+} // namespace
+
+qn_int32_t tr_ms_record_strings_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
+                                    qn_uint32_t numStrings, va_list args)
+{
+    strings_writer writer(traceId, numStrings, args);
+    return write_record(pCompId, fileToken, writer);
+}
+
+qn_int32_t tr_record_strings_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint32_t numStrings, va_list args)
+{
+    return tr_ms_record_strings_v_1(pCompId, traceId, nullptr, numStrings, args);
+}
+
+qn_int32_t tr_ms_record_strings_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
+                                  qn_uint32_t numStrings, ...)
+{
+    va_list args;
+    va_start(args, numStrings);
+    const qn_int32_t status = tr_ms_record_strings_v_1(pCompId, traceId, fileToken, numStrings, args);
+    va_end(args);
+    return status;
+}
+
+qn_int32_t tr_record_strings_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint32_t numStrings, ...)
+{
+    va_list args;
+    va_start(args, numStrings);
+    const qn_int32_t status = tr_record_strings_v_1(pCompId, traceId, numStrings, args);
+    va_end(args);
+    return status;
+}
+
+qn_int32_t tr_record_string_1(const qn_char_t *pCompId, const qn_char_t *pString)
+{
+    return tr_record_strings_1(pCompId, no_trace_id, 1, pString);
+}
+
+qn_int32_t tr_ms_record_vfmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
+                                      const qn_char_t *pFormat, va_list args)
+{
+    formatted_writer writer(traceId, pFormat, args);
+    return write_record(pCompId, fileToken, writer);
+}
+
+qn_int32_t tr_record_vfmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat,
+                                   va_list args)
+{
+    return tr_ms_record_vfmt_string_1(pCompId, traceId, nullptr, pFormat, args);
+}
+
+qn_int32_t tr_ms_record_fmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
+                                     const qn_char_t *pFormat, ...)
+{
+    va_list args;
+    va_start(args, pFormat);
+    const qn_int32_t status = tr_ms_record_vfmt_string_1(pCompId, traceId, fileToken, pFormat, args);
+    va_end(args);
+    return status;
+}
+
+qn_int32_t tr_record_fmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat, ...)
+{
+    va_list args;
+    va_start(args, pFormat);
+    const qn_int32_t status = tr_record_vfmt_string_1(pCompId, traceId, pFormat, args);
+    va_end(args);
+    return status;
+}
+
+qn_int32_t tr_record_vprintf_1(const qn_char_t *pCompId, const qn_char_t *pFormat, va_list args)
+{
+    return tr_record_vfmt_string_1(pCompId, no_trace_id, pFormat, args);
+}
+
+qn_int32_t tr_record_printf_1(const qn_char_t *pCompId, const qn_char_t *pFormat, ...)
+{
+    va_list args;
+    va_start(args, pFormat);
+    const qn_int32_t status = tr_record_vfmt_string_1(pCompId, no_trace_id, pFormat, args);
+    va_end(args);
+    return status;
+}

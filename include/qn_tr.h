@@ -49,44 +49,44 @@ QN_BEGIN_DECLS
 /* ---------------------------------------------------------------------------------------------------------------- */
 
 enum {
-    QN_TR_ECATCOUNT = 1,    /* number of categories is 0 or above 255 */
-    QN_TR_ECOMPID = 2,      /* component identifier missing */
-    QN_TR_ECATLIST = 3,     /* category descriptions missing */
-    QN_TR_ELEVELS = 4,      /* level array missing */
-    QN_TR_ECATNAME = 5,     /* a category has no name */
-    QN_TR_ECATID = 6,       /* a category_id is not below the number of categories */
-    QN_TR_EDEFLEVEL = 7,    /* a default level is above 255 */
-    QN_TR_EMINLEVEL = 8,    /* a minimum level is above 255 */
-    QN_TR_ELOCK = 9,        /* a lock could not be taken; from tr_unregister_component_1 also: tracing is stopped */
-    QN_TR_ESPECCOMP = 10,   /* specification: component pattern expected */
-    QN_TR_ESPECSEP = 11,    /* specification: separator expected */
-    QN_TR_ESPECCAT = 12,    /* specification: category pattern expected */
-    QN_TR_ESPECLEVEL = 13,  /* specification: level expected */
-    QN_TR_ENOMEM = 14,      /* memory allocation failed */
-    QN_TR_ECOMPREGEX = 15,  /* specification: component pattern is no regular expression */
-    QN_TR_ECATREGEX = 16,   /* specification: category pattern is no regular expression */
-    QN_TR_EFILENAME = 17,   /* file name invalid, or no such trace file is known */
-    QN_TR_EOPEN = 18,       /* the file could not be opened */
-    QN_TR_EFSTAT = 19,      /* fstat() failed, or the file system cannot hold trace files */
-    QN_TR_ENOTREG = 20,     /* not a regular file */
-    QN_TR_EMMAP = 21,       /* mmap() failed */
-    QN_TR_ERESIZE = 22,     /* the file's size could not be changed */
-    QN_TR_ECLEAR = 23,      /* the file's new space could not be written */
-    QN_TR_WINACTIVE = 25,   /* a warning with a result: the trace is not active, the size is the requested one */
+    QN_TR_ECATCOUNT = 1,       /* number of categories is 0 or above 255 */
+    QN_TR_ECOMPID = 2,         /* component identifier missing */
+    QN_TR_ECATLIST = 3,        /* category descriptions missing */
+    QN_TR_ELEVELS = 4,         /* level array missing */
+    QN_TR_ECATNAME = 5,        /* a category has no name */
+    QN_TR_ECATID = 6,          /* a category_id is not below the number of categories */
+    QN_TR_EDEFLEVEL = 7,       /* a default level is above 255 */
+    QN_TR_EMINLEVEL = 8,       /* a minimum level is above 255 */
+    QN_TR_ELOCK = 9,           /* a lock could not be taken; from tr_unregister_component_1 also: tracing is stopped */
+    QN_TR_ESPECCOMP = 10,      /* specification: component pattern expected */
+    QN_TR_ESPECSEP = 11,       /* specification: separator expected */
+    QN_TR_ESPECCAT = 12,       /* specification: category pattern expected */
+    QN_TR_ESPECLEVEL = 13,     /* specification: level expected */
+    QN_TR_ENOMEM = 14,         /* memory allocation failed */
+    QN_TR_ECOMPREGEX = 15,     /* specification: component pattern is no regular expression */
+    QN_TR_ECATREGEX = 16,      /* specification: category pattern is no regular expression */
+    QN_TR_EFILENAME = 17,      /* file name invalid, or no such trace file is known */
+    QN_TR_EOPEN = 18,          /* the file could not be opened */
+    QN_TR_EFSTAT = 19,         /* fstat() failed, or the file system cannot hold trace files */
+    QN_TR_ENOTREG = 20,        /* not a regular file */
+    QN_TR_EMMAP = 21,          /* mmap() failed */
+    QN_TR_ERESIZE = 22,        /* the file's size could not be changed */
+    QN_TR_ECLEAR = 23,         /* the file's new space could not be written */
+    QN_TR_WINACTIVE = 25,      /* a warning with a result: the trace is not active, the size is the requested one */
     QN_TR_ENOTREGISTERED = 26, /* no such component */
-    QN_TR_ESTRING = 27,     /* a string is NULL or empty */
-    QN_TR_EFORMAT = 28,     /* vsnprintf() failed */
-    QN_TR_EBLOCKCOUNT = 29, /* more than 128 data blocks */
-    QN_TR_EBLOCKPTR = 30,   /* a data block's pointer is NULL */
-    QN_TR_EBLOCKLEN = 31,   /* a data block is longer than 1 MiB, or its length negative */
-    QN_TR_EMSYNC = 32,      /* msync() failed */
-    QN_TR_ENOFORMAT = 33,   /* the format is NULL or empty */
-    QN_TR_ESTRCOUNT = 34,   /* number of strings is 0 or above 32 */
-    QN_TR_ENOSPACE = 35,    /* not enough free space in the file system */
-    QN_TR_ENOTTRACE = 36,   /* not a trace file */
-    QN_TR_EHANDLE = 37,     /* query handle invalid */
-    QN_TR_EINUSE = 38,      /* component identifier already registered */
-    QN_TR_ECONFOPEN = 48    /* the configuration file could not be opened */
+    QN_TR_ESTRING = 27,        /* a string is NULL or empty */
+    QN_TR_EFORMAT = 28,        /* vsnprintf() failed */
+    QN_TR_EBLOCKCOUNT = 29,    /* more than 128 data blocks */
+    QN_TR_EBLOCKPTR = 30,      /* a data block's pointer is NULL */
+    QN_TR_EBLOCKLEN = 31,      /* a data block is longer than 1 MiB, or its length negative */
+    QN_TR_EMSYNC = 32,         /* msync() failed */
+    QN_TR_ENOFORMAT = 33,      /* the format is NULL or empty */
+    QN_TR_ESTRCOUNT = 34,      /* number of strings is 0 or above 32 */
+    QN_TR_ENOSPACE = 35,       /* not enough free space in the file system */
+    QN_TR_ENOTTRACE = 36,      /* not a trace file */
+    QN_TR_EHANDLE = 37,        /* query handle invalid */
+    QN_TR_EINUSE = 38,         /* component identifier already registered */
+    QN_TR_ECONFOPEN = 48       /* the configuration file could not be opened */
 };
 
 /* ---------------------------------------------------------------------------------------------------------------- */
@@ -440,10 +440,10 @@ typedef struct key_value {
 /* One section as it stands in the file. */
 typedef struct trace_raw_section {
     char sect_name[1024];
-    qn_int32_t num_element;    /* entries of kv_list */
-    key_value_t *kv_list;      /* in file order */
-    char *pUntokenized_data;   /* the section's lines; NULL when there are none */
-    qn_int32_t bErr_flag;      /* 1 when the section has a syntax error */
+    qn_int32_t num_element;  /* entries of kv_list */
+    key_value_t *kv_list;    /* in file order */
+    char *pUntokenized_data; /* the section's lines; NULL when there are none */
+    qn_int32_t bErr_flag;    /* 1 when the section has a syntax error */
 } trace_raw_section_t;
 
 /* A piece of the file: a section or a comment line. */

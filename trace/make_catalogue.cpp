@@ -26,6 +26,7 @@ int main()
     std::printf("$quote \"\n$set 1\n");
     for (int number = 1; number < trapi_set_messages; ++number) print_message(number, cu_mesgtbl_trapi_set[number]);
     std::printf("$set 2\n");
-    print_message(1, "A syntax error in the spooling configuration has occurred.");
+    for (int i = 0; i < trace_failures; ++i)
+        print_message(fc_errtbl_trace[i].fc_desc_msg_num, fc_errtbl_trace[i].fc_desc_default);
     return 0;
 }

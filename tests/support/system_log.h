@@ -17,7 +17,7 @@ struct log_opening {
     int facility;
 };
 
-std::vector<log_line> system_log();           // since the program started, or the last clear
+std::vector<log_line> system_log(); // since the program started, or the last clear
 std::vector<log_opening> system_log_openings();
 void clear_system_log();
 bool system_log_has(const std::string &text); // a line that is exactly that, newline included

@@ -21,8 +21,7 @@ int count_components()
 bool copy_component(const component_anchor_t *component, tr_mini_component_anchor_t &copy)
 {
     const auto count = static_cast<size_t>(component->numberOfCategories);
-    copy.categories =
-        static_cast<tr_category_description_t *>(std::calloc(count, sizeof(tr_category_description_t)));
+    copy.categories = static_cast<tr_category_description_t *>(std::calloc(count, sizeof(tr_category_description_t)));
     if (copy.categories == nullptr) return false;
     copy.numberOfCategories = component->numberOfCategories;
     std::memcpy(copy.compId, component->compId, sizeof copy.compId);

@@ -31,8 +31,7 @@ int check_patterns(const pattern_pair &pair, const char *component, const char *
 {
     if (!compiled_pattern(component))
         return set_error_int(QN_TR_ECOMPREGEX, 15, static_cast<int>(pair.component.offset));
-    if (!compiled_pattern(category))
-        return set_error_int(QN_TR_ECATREGEX, 16, static_cast<int>(pair.category.offset));
+    if (!compiled_pattern(category)) return set_error_int(QN_TR_ECATREGEX, 16, static_cast<int>(pair.category.offset));
     return 0;
 }
 } // namespace qn::tr

@@ -62,10 +62,9 @@ int parse_element(specification_text &from, size_t end, trace_level_spec_t *&fir
 void set_level(const trace_level_spec_t *spec, component_anchor_t *component, int entry)
 {
     const tr_category_description_t &category = component->categories[entry];
-    const qn_uint32_t level =
-        spec->detailLevel == default_level
-            ? category.default_level_of_detail
-            : std::max(static_cast<qn_uint32_t>(spec->detailLevel), category.minimum_level_of_detail);
+    const qn_uint32_t level = spec->detailLevel == default_level ? category.default_level_of_detail
+                                                                 : std::max(static_cast<qn_uint32_t>(spec->detailLevel),
+                                                                            category.minimum_level_of_detail);
     // Of a level above 255 the low eight bits count.
     store_relaxed(component->pDetailLevels[category.category_id], static_cast<tr_detail_level_t>(level));
 }

@@ -33,10 +33,10 @@ struct trace_anchor {
     unsigned char *pMapEnd;      // one past the mapping
     qn_uint32_t seqNumber;       // of the last record
     trace_record_header_t *pNextFree;
-    trace_record_header_t *pWrap;   // start of the ring
-    qn_uint32_t uMaxSize;           // longest record; 0 while the file is not started. Also read without the lock
-    qn_int32_t pageSize;            // of memory
-    component_anchor_t *pFirstComp; // default anchor. Global mutex and component list mutex
+    trace_record_header_t *pWrap;         // start of the ring
+    qn_uint32_t uMaxSize;                 // longest record; 0 while the file is not started. Also read without the lock
+    qn_int32_t pageSize;                  // of memory
+    component_anchor_t *pFirstComp;       // default anchor. Global mutex and component list mutex
     char fileName[trace_file_name_bytes]; // empty: no file. Global mutex; a page set's head has its first page's name
     qn_uint32_t uRequestedFileSize;       // bytes
     qn_uint32_t uActualFileSize;          // bytes mapped; 0 while the file is not started

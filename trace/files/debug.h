@@ -12,7 +12,10 @@ extern qn_uint32_t global_debug_level;
 
 namespace qn::tr
 {
-inline bool debug_level_above(qn_uint32_t level) { return __builtin_expect(load_relaxed(global_debug_level) > level, 0); }
+inline bool debug_level_above(qn_uint32_t level)
+{
+    return __builtin_expect(load_relaxed(global_debug_level) > level, 0);
+}
 
 // Writes one line at priority warning when the level is above 7. A cancellation point then.
 void debug(const char *format, ...) QN_PRINTF_LIKE(1, 2);

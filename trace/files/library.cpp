@@ -42,8 +42,7 @@ void name_default_file(trace_anchor_t *anchor, const char *name)
     const size_t length = std::strlen(directory);
     const char *separator = length > 0 && directory[length - 1] == '/' ? "" : "/";
     // Cut to the field, like every file name.
-    const int written =
-        std::snprintf(anchor->fileName, sizeof anchor->fileName, "%s%s%s", directory, separator, name);
+    const int written = std::snprintf(anchor->fileName, sizeof anchor->fileName, "%s%s%s", directory, separator, name);
     (void)written;
 }
 
@@ -71,8 +70,7 @@ int init(trace_anchor_t *anchor)
     value = environment("QN_TR_SIZE");
     if (value != nullptr) size_default_file(anchor, value);
     value = environment("QN_TR_DEBUG_LEVEL");
-    if (value != nullptr)
-        store_relaxed(global_debug_level, static_cast<qn_uint32_t>(std::strtoul(value, nullptr, 0)));
+    if (value != nullptr) store_relaxed(global_debug_level, static_cast<qn_uint32_t>(std::strtoul(value, nullptr, 0)));
     if (debug_level_above(0)) openlog("opal_trace", LOG_CONS | LOG_NDELAY | LOG_PID, LOG_DAEMON);
 
     value = environment("QN_TR_TRACE_LEVELS");

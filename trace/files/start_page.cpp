@@ -3,13 +3,13 @@
 // Anchor set lock, held by the caller.
 #include <cerrno>
 #include <cstring>
+#include <ctime>
 #include <fcntl.h>
 #include <grp.h>
 #include <sys/mman.h>
 #include <sys/stat.h>
 #include <sys/time.h>
 #include <sys/vfs.h>
-#include <ctime>
 #include <unistd.h>
 
 #include "trace/files/debug.h"

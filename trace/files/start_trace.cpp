@@ -144,10 +144,7 @@ qn_int32_t trace_reinit(trace_anchor_t *anchor)
     return start_trace(anchor);
 }
 
-int is_trace_on(trace_anchor_t *anchor)
-{
-    return anchor->fileName[0] != '\0' && any_category_traces() ? 1 : 0;
-}
+int is_trace_on(trace_anchor_t *anchor) { return anchor->fileName[0] != '\0' && any_category_traces() ? 1 : 0; }
 
 namespace qn::tr
 {

@@ -141,8 +141,7 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
     overwritten_start start;
     for (qn_uint32_t count = 0;; ++count) {
         if (count > max_alloc_loop) return give_up_looping(pAnchor, requested);
-        if (__builtin_expect(next->seqNumber == load_relaxed(header->uSeqLock), 0))
-            wait_tail(pAnchor, next->seqNumber);
+        if (__builtin_expect(next->seqNumber == load_relaxed(header->uSeqLock), 0)) wait_tail(pAnchor, next->seqNumber);
         const qn_uint32_t room = bytes_to_end(pAnchor, next);
         start.look_at(next, room);
         if (__builtin_expect(next->length > room, 0)) clip_to_mapping(pAnchor, next);

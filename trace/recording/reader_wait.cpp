@@ -2,8 +2,8 @@
 // of the trace: it is bounded, and what the reader asked for is overridden at its end.
 #include <unistd.h>
 
-#include "trace/files/trace_file.h"
 #include "trace/files/shared_words.h"
+#include "trace/files/trace_file.h"
 #include "trace/recording/recording.h"
 
 using namespace qn::tr;

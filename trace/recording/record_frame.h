@@ -37,9 +37,7 @@ struct record_writer {
 // behind its end, unless these lie in another memory page, which may not exist.
 __attribute__((no_sanitize("address"))) inline void copy_component_id(char *to, const char *from)
 {
-    struct [[gnu::packed, gnu::may_alias]] word {
-        qn_uint32_t bytes;
-    };
+    struct [[gnu::packed, gnu::may_alias]] word { qn_uint32_t bytes; };
     constexpr uintptr_t memory_page = 4096;
     const uintptr_t room = memory_page - reinterpret_cast<uintptr_t>(from) % memory_page;
     qn_uint32_t bytes = 0;

@@ -61,11 +61,11 @@ qn_int32_t segfault_restart(trace_anchor_t *pAnchor)
 qn_int32_t __time_calibration(trace_anchor_t *pAnchor)
 {
     if (pAnchor->uMaxSize == 0) return 0;
-    write_own_record<time_calibration_t>(
-        pAnchor, format::kind::time_calibration, sizeof(time_calibration_t), [=](time_calibration_t *record) {
-            cu_timeinfo_t time_info = header_of(pAnchor)->timeInfo;
-            cu_compute_base_timeinfo_1(&time_info);
-            record->reBase = time_info;
-        });
+    write_own_record<time_calibration_t>(pAnchor, format::kind::time_calibration, sizeof(time_calibration_t),
+                                         [=](time_calibration_t *record) {
+                                             cu_timeinfo_t time_info = header_of(pAnchor)->timeInfo;
+                                             cu_compute_base_timeinfo_1(&time_info);
+                                             record->reBase = time_info;
+                                         });
     return 0;
 }

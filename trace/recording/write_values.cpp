@@ -103,8 +103,7 @@ qn_int32_t tr_record_int32_2_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn
     return tr_record_values_32_1(pCompId, traceId, 2, iValue1, iValue2);
 }
 
-qn_int32_t tr_record_uint32_2_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint32_t iValue1,
-                                qn_uint32_t iValue2)
+qn_int32_t tr_record_uint32_2_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint32_t iValue1, qn_uint32_t iValue2)
 {
     return tr_record_values_32_1(pCompId, traceId, 2, iValue1, iValue2);
 }
@@ -155,8 +154,7 @@ qn_int32_t tr_record_int64_2_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn
     return tr_record_values_64_1(pCompId, traceId, 2, iValue1, iValue2);
 }
 
-qn_int32_t tr_record_uint64_2_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint64_t iValue1,
-                                qn_uint64_t iValue2)
+qn_int32_t tr_record_uint64_2_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint64_t iValue1, qn_uint64_t iValue2)
 {
     return tr_record_values_64_1(pCompId, traceId, 2, iValue1, iValue2);
 }

@@ -88,8 +88,6 @@ int init(trace_anchor_t *anchor)
     return 0;
 }
 
-int master_override_off(void) { return load_relaxed(global_switch); }
-
 void global_stop_trace(void) { store_relaxed(global_switch, 1); }
 
 void register_atfork(void) { pthread_atfork(nullptr, nullptr, atfork_child); }

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "trace/files/anchor.h"
+#include "trace/files/shared_words.h"
 
 extern int global_switch;                  // 1 once tracing has been stopped for good; read without a lock
 extern int this_is_child;                  // 1 in a child forked after the library was initialised
@@ -13,7 +14,7 @@ extern pthread_once_t sp_read_cfg;         // reading of the spooling configurat
 int init(trace_anchor_t *anchor);
 
 // Non-zero when tracing has been stopped for good.
-int master_override_off(void);
+inline int master_override_off(void) { return qn::tr::load_relaxed(global_switch); }
 void global_stop_trace(void);
 
 void register_atfork(void);

@@ -7,7 +7,7 @@
 //                       ^ pNextFree                                                     ^ pNextFree
 //
 // At every instant the records tile the ring, so that a process killed between any two stores leaves a ring that can be
-// continued: a record first covers all that was consumed and is cut to its length when the rest has its header.
+// continued. The last part, and a short way for the usual case, are in space.h.
 #include <cstdio>
 
 #include "trace/files/debug.h"
@@ -15,6 +15,7 @@
 #include "trace/files/locks.h"
 #include "trace/files/trace_file.h"
 #include "trace/recording/recording.h"
+#include "trace/recording/space.h"
 
 namespace
 {
@@ -37,39 +38,29 @@ qn_uint32_t bytes_to_end(const trace_anchor_t *anchor, const trace_record_header
     return static_cast<qn_uint32_t>(anchor->pMapEnd - reinterpret_cast<const unsigned char *>(record));
 }
 
-trace_record_header_t *behind(trace_record_header_t *record, qn_uint32_t bytes)
-{
-    return reinterpret_cast<trace_record_header_t *>(reinterpret_cast<unsigned char *>(record) + bytes);
-}
-
-// Names the record that a reader starts from.
-void publish_oldest(trace_anchor_t *anchor)
-{
-    const auto offset = reinterpret_cast<unsigned char *>(anchor->pNextFree) - anchor->pMap;
-    store_relaxed(header_of(anchor)->uOldestRecordOffset, static_cast<qn_uint32_t>(offset));
-}
-
-// The start record overwritten last: the header takes over its time base and process.
-struct overwritten_start {
-    bool found = false;
-    qn_uint32_t pid = 0;
-    cu_timeinfo_t time_info{};
-
-    void look_at(const trace_record_header_t *record, qn_uint32_t room)
-    {
-        if (record->function != start_kind || room < sizeof(trace_record_start_t)) return;
-        const auto *start = reinterpret_cast<const trace_record_start_t *>(record);
-        found = true;
-        pid = start->pid;
-        time_info = start->timeInfo;
-    }
-    void keep_in(trace_file_header_t *header) const
-    {
-        if (!found) return;
-        header->timeInfo = time_info;
-        store_relaxed(header->uPid, pid);
-    }
+// What the header takes over from a start record that is overwritten: without it the records behind that one would have
+// no time base.
+struct start_of_process {
+    qn_uint32_t pid;
+    cu_timeinfo_t time_info;
 };
+
+[[gnu::cold, gnu::noinline]] void remember(start_of_process &of, const trace_file_header_t *header,
+                                           const trace_record_header_t *record, qn_uint32_t room)
+{
+    if (room < sizeof(trace_record_start_t)) {
+        of = {load_relaxed(header->uPid), header->timeInfo}; // cut off by the end of the file: no body to be read
+        return;
+    }
+    const auto *start = reinterpret_cast<const trace_record_start_t *>(record);
+    of = {start->pid, start->timeInfo};
+}
+
+[[gnu::cold, gnu::noinline]] void keep_in_header(trace_file_header_t *header, const start_of_process &start)
+{
+    header->timeInfo = start.time_info;
+    store_relaxed(header->uPid, start.pid);
+}
 
 [[gnu::cold, gnu::noinline]] trace_record_header_t *give_up(trace_anchor_t *anchor, const char *reason)
 {
@@ -108,6 +99,33 @@ struct overwritten_start {
     keep_store_order();
     filler->function = free_space;
 }
+// The record leaves no room for a rest's header before the end of the file: the rest is declared at the start of the
+// ring. Cannot come about with a sound mapping.
+[[gnu::cold, gnu::noinline]] trace_record_header_t *claim_before_start(trace_anchor_t *anchor, qn_uint32_t consumed,
+                                                                       unsigned int requested)
+{
+    trace_record_header_t *record = anchor->pNextFree;
+    record->function = being_written;
+    keep_store_order();
+    record->length = consumed;
+    anchor->seqNumber += 2;
+    record->seqNumber = anchor->seqNumber;
+    anchor->pNextFree = anchor->pWrap;
+    anchor->pWrap->function = free_space;
+    anchor->pWrap->seqNumber = format::seq_filler;
+    keep_store_order();
+    record->length = requested;
+    store_relaxed(header_of(anchor)->uOldestRecordOffset, header_of(anchor)->uOffset);
+    return record;
+}
+
+// The record ends where the file ends. A page that is full stays so, its oldest record the first; a single file goes on
+// at the start of the ring.
+void start_over(trace_anchor_t *anchor)
+{
+    if (!is_multipage(anchor)) anchor->pNextFree = anchor->pWrap;
+    store_relaxed(header_of(anchor)->uOldestRecordOffset, header_of(anchor)->uOffset);
+}
 } // namespace
 
 trace_record_header_t *allocate_space(trace_anchor_t *pAnchor, unsigned int *pReqLength)
@@ -123,7 +141,6 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
     trace_file_header_t *header = header_of(pAnchor);
     const unsigned int requested = *pReqLength;
     const qn_uint64_t needed = qn_uint64_t{requested} + record_header_bytes;
-    const qn_uint32_t max_alloc_loop = pAnchor->uRequestedFileSize / record_header_bytes;
 
     // One comparison for two questions: is the record too long, and has a reader asked us to wait? A request is seen by
     // the records that, with it, come to more than the longest one.
@@ -132,68 +149,51 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
         if (tail_request == 0) return nullptr;
         do_coordination(pAnchor);
     }
-    if (requested % 2 != 0) debug("Odd length requested: %u\n", requested);
+    if (__builtin_expect(requested % 2 != 0, 0)) debug("Odd length requested: %u\n", requested);
 
     trace_record_header_t *next = pAnchor->pNextFree;
-    if (bytes_to_end(pAnchor, next) == 0) return pageFull(pAnchor, pReqLength); // the last record filled a page exactly
-    qn_uint32_t consumed = 0;
+    const unsigned char *end = pAnchor->pMapEnd;
+    if (__builtin_expect(address(next) == end, 0)) return pageFull(pAnchor, pReqLength); // filled exactly
+    const trace_record_header_t *start = nullptr; // the last start record among those consumed
+    qn_uint64_t consumed = 0;
     bool wrapped = false;
-    overwritten_start start;
-    for (qn_uint32_t count = 0;; ++count) {
-        if (count > max_alloc_loop) return give_up_looping(pAnchor, requested);
+    for (qn_int64_t budget = pAnchor->uRequestedFileSize;; budget -= record_header_bytes) {
+        if (__builtin_expect(budget < 0, 0)) return give_up_looping(pAnchor, requested);
         if (__builtin_expect(next->seqNumber == load_relaxed(header->uSeqLock), 0)) wait_tail(pAnchor, next->seqNumber);
-        const qn_uint32_t room = bytes_to_end(pAnchor, next);
-        start.look_at(next, room);
-        if (__builtin_expect(next->length > room, 0)) clip_to_mapping(pAnchor, next);
-        const qn_uint32_t length = next->length;
-        consumed += length;
+        if (__builtin_expect(next->function == start_kind, 0)) start = next;
+        const unsigned char *behind_next = address(next) + next->length;
+        if (__builtin_expect(behind_next > end, 0)) {
+            clip_to_mapping(pAnchor, next);
+            behind_next = end;
+        }
+        consumed += static_cast<qn_uint64_t>(behind_next - address(next));
         if (consumed >= needed) break;
 
-        next = behind(next, length);
-        if (length == room) {
+        next = record_of(behind_next);
+        if (__builtin_expect(behind_next == end, 0)) {
             if (wrapped) return give_up(pAnchor, "opal_trace: allocate_space allocation loop overwrap\n");
             if (is_multipage(pAnchor)) return pageFull(pAnchor, pReqLength);
             wrapped = true;
-            wrap_round(pAnchor, consumed);
+            wrap_round(pAnchor, static_cast<qn_uint32_t>(consumed));
             next = pAnchor->pNextFree;
             consumed = 0;
-        } else if (room - length < record_header_bytes) {
+        } else if (__builtin_expect(behind_next > end - record_header_bytes, 0)) {
             return give_up(pAnchor, "opal_trace: allocate_space overrun one\n");
         }
     }
+    start_of_process overwritten;
+    if (__builtin_expect(start != nullptr, 0)) remember(overwritten, header, start, bytes_to_end(pAnchor, start));
 
-    trace_record_header_t *record = pAnchor->pNextFree;
-    record->function = being_written;
-    keep_store_order();
-    record->length = consumed;
-    pAnchor->seqNumber += 2;
-    record->seqNumber = pAnchor->seqNumber;
-    if (consumed > needed) {
-        trace_record_header_t *rest = behind(record, requested);
-        if (__builtin_expect(bytes_to_end(pAnchor, rest) < record_header_bytes, 0)) {
-            if (is_multipage(pAnchor)) return pageFull(pAnchor, pReqLength);
-            rest = pAnchor->pWrap;
-        } else {
-            rest->length = consumed - requested;
-        }
-        pAnchor->pNextFree = rest;
-        rest->function = free_space;
-        rest->seqNumber = format::seq_filler;
-        keep_store_order();
-        record->length = requested;
+    trace_record_header_t *record = nullptr;
+    if (consumed == needed || address(pAnchor->pNextFree) + requested <= end - record_header_bytes) {
+        record = claim(pAnchor, static_cast<qn_uint32_t>(consumed), requested);
+    } else if (is_multipage(pAnchor)) {
+        return pageFull(pAnchor, pReqLength);
     } else {
-        // No room for a rest: the record keeps the 28 bytes.
-        pAnchor->pNextFree = behind(record, consumed);
-        if (bytes_to_end(pAnchor, pAnchor->pNextFree) == 0 && !is_multipage(pAnchor))
-            pAnchor->pNextFree = pAnchor->pWrap;
+        record = claim_before_start(pAnchor, static_cast<qn_uint32_t>(consumed), requested);
     }
-    keep_store_order();
-    publish_oldest(pAnchor);
-
-    record->threadId = static_cast<qn_uint32_t>(pthread_self());
-    qn_uint64_t now = 0;
-    cu_get_ctr_1(&now);
-    record->timeStamp = now;
-    start.keep_in(header);
+    if (address(pAnchor->pNextFree) == end) start_over(pAnchor);
+    stamp(record);
+    if (__builtin_expect(start != nullptr, 0)) keep_in_header(header, overwritten);
     return record;
 }

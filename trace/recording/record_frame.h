@@ -19,6 +19,7 @@
 #include "trace/files/locks.h"
 #include "trace/files/trace_file.h"
 #include "trace/recording/recording.h"
+#include "trace/recording/space.h"
 
 namespace qn::tr
 {
@@ -67,7 +68,7 @@ inline qn_int32_t write_record(const qn_char_t *comp_id, tr_file_token_t token, 
     status = writer.size(anchor, length);
     if (status != 0) return status;
 
-    trace_record_header_t *header = allocate_space(anchor, &length);
+    trace_record_header_t *header = reserve(anchor, length);
     if (header == nullptr) return 0;
     copy_component_id(header->compId, comp_id);
     writer.fill(reinterpret_cast<typename Writer::record *>(header));

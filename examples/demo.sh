@@ -11,11 +11,11 @@ qntrace=$build/tools/qntrace/qntrace
 
 step() { printf '\n\033[1m== %s\033[0m\n' "$*"; }
 
-# Records per component and kind, from the reader's JSON lines.
+# Records per component and kind, from the reader's text: a record's line is time, sequence, thread, component, kind.
 count_records() {
-    "$qntrace" dump --json "$1" 2>/dev/null |
-        sed -n 's/.*"component":"\([^"]*\)".*"kind":"\([^"]*\)".*/\1 \2/p' | sort | uniq -c |
-        awk '{ printf "  %-6s %-12s %8d\n", $2, $3, $1 }'
+    awk '/^[0-9][0-9][0-9][0-9]-/ { count[$4 " " $5]++ }
+         END { for (what in count) { split(what, part, " "); printf "  %-6s %-12s %8d\n", part[1], part[2], count[what] } }' \
+        "$folder/text" | sort
 }
 
 show() {
@@ -24,13 +24,21 @@ show() {
     tail -n 12 "$folder/text"
     cat "$folder/messages"
     printf '\nrecords in the trace (exit status of the reader: %d):\n' "$status"
-    count_records "$1"
+    count_records
 }
 
 step "treeindex reads /usr/include with four threads, tracing into a ring of 1 MiB"
 "$treeindex" -t "$folder/whole.trc" /usr/include /usr/include/no-such-folder
 step "the end of its trace, decoded"
 show "$folder/whole.trc"
+
+step "again, with more detail asked for from outside, and the file names in a trace file of their own"
+QN_TR_TRACE_LEVELS='WALK:Queue=1,INDX:Content' \
+    "$treeindex" -t "$folder/detail.trc" -n "$folder/names.trc" /usr/include /usr/include/no-such-folder
+step "the end of its trace, decoded"
+show "$folder/detail.trc"
+step "who wrote the names, and what is left of them in 64 KiB"
+show "$folder/names.trc" | tail -n 6
 
 step "again, killed with SIGKILL while its threads write"
 "$treeindex" -t "$folder/killed.trc" -r 1000000 /usr/include /usr/include/no-such-folder &

@@ -5,7 +5,10 @@
  * it. An ordinary client of the tracing library: it includes <qn_tr.h> alone, registers two components, and asks at
  * every trace point whether the record is wanted.
  *
- *   treeindex [-t trace-file] [-s trace-bytes] [-j threads] [-r rounds] [folder ...]
+ *   treeindex [-t trace-file] [-s trace-bytes] [-n names-file] [-j threads] [-r rounds] [folder ...]
+ *
+ * With -n, the names of the files that it reads go to a trace file of their own. What else is traced, and in how much
+ * detail, is steered from outside: QN_TR_TRACE_LEVELS='WALK:Queue=1,INDX:Content' adds the queue and file summaries.
  */
 #include <ctype.h>
 #include <dirent.h>
@@ -39,6 +42,7 @@ static const tr_category_description_t indx_categories[] = {
 };
 static tr_detail_level_t walk_levels[4];
 static tr_detail_level_t indx_levels[4];
+static tr_file_token_t *indx_files; /* per category, the trace file that it goes to */
 
 /* Trace points, by number: what the reader of a trace sees as "id". */
 enum {
@@ -131,7 +135,7 @@ static void read_file(struct index *index, const char *name)
     QN_TR_IF(indx_levels, INDX_FILES, 1,
              tr_record_values_64_1("INDX", FILE_READ, 3, (qn_int64_t)bytes, (qn_int64_t)(index->lines - lines),
                                    (qn_int64_t)(index->words - words)));
-    QN_TR_IF(indx_levels, INDX_NAMES, 1, tr_record_strings_1("INDX", FILE_NAME, 1, name));
+    QN_TR_IF(indx_levels, INDX_NAMES, 1, tr_ms_record_strings_1("INDX", FILE_NAME, indx_files[INDX_NAMES], 1, name));
     QN_TR_IF(
         indx_levels, INDX_CONTENT, 2,
         tr_record_fmt_string_1("INDX", FILE_SUMMARY, "%s: %lu bytes, %lu lines", name, bytes, index->lines - lines));
@@ -259,37 +263,37 @@ static bool run_threads(struct index *parts, int count)
     return started > 0;
 }
 
-static bool start_tracing(const char *trace_file, unsigned long trace_bytes)
+static bool start_tracing(const char *trace_file, qn_uint32_t trace_bytes, const char *names_file)
 {
-    char size[32];
-    snprintf(size, sizeof size, "%lu", trace_bytes);
-    setenv("QN_TR_SIZE", size, 0);
-    return tr_set_filename_1(trace_file) == 0 &&
-           tr_register_component_1("WALK", walk_levels, walk_categories, 4) == 0 &&
-           tr_register_component_1("INDX", indx_levels, indx_categories, 4) == 0;
+    if (tr_set_size_1(trace_bytes) != 0 || tr_set_filename_1(trace_file) != 0) return false;
+    if (names_file != NULL && tr_set_file_map_1(names_file, "INDX:Names") != 0) return false;
+    return tr_register_component_1("WALK", walk_levels, walk_categories, 4) == 0 &&
+           tr_ms_register_component_1("INDX", indx_levels, indx_categories, 4, &indx_files) == 0;
 }
 
 int main(int argc, char **argv)
 {
     const char *trace_file = "treeindex.trc";
-    unsigned long trace_bytes = 1 << 20;
+    const char *names_file = NULL;
+    qn_uint32_t trace_bytes = 1 << 20;
     long rounds = 1;
     int threads = 4;
     int option = 0;
-    while ((option = getopt(argc, argv, "t:s:j:r:")) != -1) {
+    while ((option = getopt(argc, argv, "t:s:n:j:r:")) != -1) {
         switch (option) {
         case 't': trace_file = optarg; break;
-        case 's': trace_bytes = strtoul(optarg, NULL, 0); break;
+        case 's': trace_bytes = (qn_uint32_t)strtoul(optarg, NULL, 0); break;
+        case 'n': names_file = optarg; break;
         case 'j': threads = atoi(optarg); break;
         case 'r': rounds = atol(optarg); break;
         default:
-            fprintf(stderr, "usage: treeindex [-t file] [-s bytes] [-j threads] [-r rounds] [folder ...]\n");
+            fprintf(stderr, "usage: treeindex [-t file] [-s bytes] [-n file] [-j threads] [-r rounds] [folder ...]\n");
             return 2;
         }
     }
     if (threads < 1 || threads > 64) threads = 4;
 
-    if (!start_tracing(trace_file, trace_bytes)) {
+    if (!start_tracing(trace_file, trace_bytes, names_file)) {
         cu_error_t *error = NULL;
         char *text = NULL;
         if (cu_get_error_1(&error) == 0 && cu_get_errmsg_1(error, &text) == 0) fprintf(stderr, "treeindex: %s", text);

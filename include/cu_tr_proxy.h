@@ -16,8 +16,8 @@ QN_BEGIN_DECLS
 /* What the tracing library lends. Either pointer may be null: that call then does nothing. */
 typedef struct tr_proxy_func_table {
     qn_int32_t (*p_tr_flush)(void);
-    qn_int32_t (*p_tr_record_vfmt_string)(const qn_char_t *pCompId, qn_uint32_t traceId,
-                                          const qn_char_t *pFormat, va_list arguments);
+    qn_int32_t (*p_tr_record_vfmt_string)(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat,
+                                          va_list arguments);
 } tr_proxy_func_table_t;
 
 /*
@@ -41,8 +41,8 @@ QN_EXPORT qn_int32_t cu_trp_flush_1(void);
  *
  * Returns what the tracing library returns, 0 without a table; the inserts are then not looked at.
  */
-QN_EXPORT qn_int32_t cu_trp_printf_1(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat,
-                                     ...) QN_PRINTF_LIKE(3, 4);
+QN_EXPORT qn_int32_t cu_trp_printf_1(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat, ...)
+    QN_PRINTF_LIKE(3, 4);
 
 QN_END_DECLS
 

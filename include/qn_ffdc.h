@@ -76,8 +76,8 @@ typedef struct fc_err_tbl {
  *
  * Returns the length of the text in buffer, or -1 when buffer is null or buffer_size is not positive.
  */
-QN_EXPORT int fc_mk_syslog_msg_1(const fc_err_tbl_t *entry, const void *detail_data, int detail_data_len,
-                                 char *buffer, int buffer_size, nl_catd catalogue);
+QN_EXPORT int fc_mk_syslog_msg_1(const fc_err_tbl_t *entry, const void *detail_data, int detail_data_len, char *buffer,
+                                 int buffer_size, nl_catd catalogue);
 
 /*
  * Files the report of a failure: makes its identifier, writes one line to the system log and, when the folder
@@ -100,10 +100,10 @@ QN_EXPORT int fc_mk_syslog_msg_1(const fc_err_tbl_t *entry, const void *detail_d
  * Returns 0, also without the folder; the errno value when the record could not be appended (identifier and
  * system log are there all the same); ENOMEM when there is no memory, with only the identifier made.
  */
-QN_EXPORT int fc_log_error_1(fc_eid_t id, int reserved0, const char *component, const char *subsystem,
-                             const char *file, const char *vers, int line, int reserved1, int log_event,
-                             int error_id, const void *detail_data, int detail_data_len,
-                             const char *detail_data_file, const char *syslog_text);
+QN_EXPORT int fc_log_error_1(fc_eid_t id, int reserved0, const char *component, const char *subsystem, const char *file,
+                             const char *vers, int line, int reserved1, int log_event, int error_id,
+                             const void *detail_data, int detail_data_len, const char *detail_data_file,
+                             const char *syslog_text);
 
 QN_END_DECLS
 

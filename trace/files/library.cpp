@@ -1,9 +1,9 @@
 // Lazy initialisation from the environment, the fork handler and the stop switch. Global mutex, held by init's caller.
 #include "trace/files/library.h"
 
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <string_view>
 #include <sys/syslog.h>
 #include <unistd.h>
 
@@ -31,6 +31,16 @@ const char *environment(const char *name)
     return value != nullptr && value[0] != '\0' ? value : nullptr;
 }
 
+// Cut to the field, like every file name.
+void add_to_file_name(trace_anchor_t *anchor, const char *text)
+{
+    const size_t length = std::strlen(anchor->fileName);
+    const size_t room = sizeof anchor->fileName - 1 - length;
+    const size_t added = strnlen(text, room);
+    std::memcpy(anchor->fileName + length, text, added);
+    anchor->fileName[length + added] = '\0';
+}
+
 void name_default_file(trace_anchor_t *anchor, const char *name)
 {
     if (name[0] == '/') {
@@ -39,17 +49,15 @@ void name_default_file(trace_anchor_t *anchor, const char *name)
     }
     char directory[trace_file_name_bytes];
     if (getcwd(directory, sizeof directory) == nullptr) directory[0] = '\0';
-    const size_t length = std::strlen(directory);
-    const char *separator = length > 0 && directory[length - 1] == '/' ? "" : "/";
-    // Cut to the field, like every file name.
-    const int written = std::snprintf(anchor->fileName, sizeof anchor->fileName, "%s%s%s", directory, separator, name);
-    (void)written;
+    set_file_name(anchor, directory);
+    if (!std::string_view(directory).ends_with('/')) add_to_file_name(anchor, "/");
+    add_to_file_name(anchor, name);
 }
 
 void size_default_file(trace_anchor_t *anchor, const char *value)
 {
-    const auto size = static_cast<qn_uint32_t>(std::strtoul(value, nullptr, 0));
-    if (std::strtoul(value, nullptr, 0) != 0) anchor->uRequestedFileSize = size;
+    const unsigned long size = std::strtoul(value, nullptr, 0);
+    if (size != 0) anchor->uRequestedFileSize = static_cast<qn_uint32_t>(size);
 }
 
 tr_proxy_func_table_t _trp_funcs = {tr_flush_1, tr_record_vfmt_string_1};

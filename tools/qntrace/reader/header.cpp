@@ -15,6 +15,7 @@ namespace format = qn::tr::format;
 
 // The part of the header that every version has; what lies behind it is there when `uOffset` leaves room for it.
 constexpr std::uint32_t common_header_bytes = offsetof(trace_file_header_t, program);
+constexpr std::uint32_t longest_header_bytes = 4096; // no version comes near it
 constexpr std::uint16_t first_version_with_node_id = 4;
 constexpr std::uint16_t first_version_with_pages = 5;
 
@@ -50,8 +51,7 @@ void parse_rest(file_header &header, std::span<const std::byte> bytes)
     };
     header.program = text(offsetof(trace_file_header_t, program), sizeof(trace_file_header_t::program));
     header.build_name = text(offsetof(trace_file_header_t, buildName), sizeof(trace_file_header_t::buildName));
-    header.base_program =
-        text(offsetof(trace_file_header_t, baseProgName), sizeof(trace_file_header_t::baseProgName));
+    header.base_program = text(offsetof(trace_file_header_t, baseProgName), sizeof(trace_file_header_t::baseProgName));
     constexpr std::size_t node_id_at = offsetof(trace_file_header_t, uNode_ID);
     if (header.version >= first_version_with_node_id && view.holds(node_id_at, 8)) {
         header.node_id = view.u64(node_id_at);
@@ -63,49 +63,46 @@ void parse_rest(file_header &header, std::span<const std::byte> bytes)
     }
 }
 
-bool offset_plausible(const file_header &header, std::uint64_t file_bytes)
+bool offset_plausible(const file_header &header)
 {
-    return header.ring_offset >= common_header_bytes && header.ring_offset % 4 == 0 &&
-           std::uint64_t{header.ring_offset} + format::record_header_bytes <= file_bytes;
+    return header.ring_offset >= common_header_bytes && header.ring_offset <= longest_header_bytes &&
+           header.ring_offset % 4 == 0;
 }
 
-// Whatever the file's length: a truncated file's header still tells its full size.
+// Says nothing about the file's real length: a truncated file's header still tells its full size.
 bool size_plausible(const file_header &header)
 {
-    return header.file_size >= std::uint64_t{header.ring_offset} + format::record_header_bytes;
+    return header.file_size >= common_header_bytes + format::record_header_bytes;
 }
 
-bool plausible(const file_header &header, std::uint64_t file_bytes)
+bool plausible(const file_header &header)
 {
-    return header.version <= format::format_version && offset_plausible(header, file_bytes) &&
-           size_plausible(header);
+    return header.version <= format::format_version && offset_plausible(header) && size_plausible(header);
 }
 
 bool oldest_plausible(std::uint64_t oldest, const ring_bounds &ring)
 {
-    return oldest >= ring.begin && (oldest - ring.begin) % 4 == 0 &&
-           oldest + format::record_header_bytes <= ring.end;
+    return oldest >= ring.begin && (oldest - ring.begin) % 4 == 0 && oldest + format::record_header_bytes <= ring.end;
 }
 
 // The header in the byte order that its first byte names, or in the other one when only that makes sense.
-file_header parse_in_its_order(std::span<const std::byte> bytes, std::uint64_t file_bytes,
-                               const finding_sink &report)
+file_header parse_in_its_order(std::span<const std::byte> bytes, const finding_sink &report)
 {
     const bool little = (std::to_integer<unsigned>(bytes[0]) & format::properties::little_endian) != 0;
     const auto named = parse(bytes, little ? byte_order::little : byte_order::big);
-    if (plausible(named, file_bytes)) return named;
+    if (plausible(named)) return named;
     const auto other = parse(bytes, little ? byte_order::big : byte_order::little);
-    if (!plausible(other, file_bytes)) return named;
+    if (!plausible(other)) return named;
     report({finding::severity::damage, 0,
             fmt::format("the byte-order bit 0x80 contradicts the rest of the header, which is {}-endian",
                         little ? "big" : "little")});
     return other;
 }
 
-void set_ring_begin(file_header &header, std::uint64_t file_bytes, const finding_sink &report)
+void set_ring_begin(file_header &header, const finding_sink &report)
 {
     header.ring.begin = header.ring_offset;
-    if (offset_plausible(header, file_bytes)) return;
+    if (offset_plausible(header)) return;
     header.ring.begin = format::header_bytes;
     report({finding::severity::damage, offsetof(trace_file_header_t, uOffset),
             fmt::format("the header gives {} as the offset of the first record; {} is used", header.ring_offset,
@@ -153,10 +150,10 @@ std::optional<file_header> read_header(window &file, const finding_sink &report)
         return std::nullopt;
     }
 
-    auto header = parse_in_its_order(bytes, file_bytes, report);
+    auto header = parse_in_its_order(bytes, report);
     const bool marked = (header.properties & format::properties::always) != 0;
-    const bool bounded = offset_plausible(header, file_bytes) && size_plausible(header);
-    const bool half_bounded = offset_plausible(header, file_bytes) || size_plausible(header);
+    const bool bounded = offset_plausible(header) && size_plausible(header);
+    const bool half_bounded = offset_plausible(header) || size_plausible(header);
     const bool known_version = header.version <= format::format_version;
     if (!half_bounded || (!bounded && !(marked && known_version))) {
         report({finding::severity::damage, 0, "not a trace file: its header makes no sense"});
@@ -172,7 +169,7 @@ std::optional<file_header> read_header(window &file, const finding_sink &report)
         report({finding::severity::damage, 0, "the property bit 0x40, which every trace file has, is not set"});
     }
 
-    set_ring_begin(header, file_bytes, report);
+    set_ring_begin(header, report);
     if (header.ring.begin + format::record_header_bytes > file_bytes) {
         report({finding::severity::damage, file_bytes, "the file ends before its first record"});
         return std::nullopt;

@@ -1,0 +1,33 @@
+// Reading the counter and a clock at the same moment. No state.
+#include "platform/cu/clock_pair.h"
+
+#include <cerrno>
+
+#include "platform/cu/counter.h"
+
+namespace qn::cu
+{
+int read_pair(clockid_t clock, clock_pair *pair)
+{
+    timespec now{};
+    const uint64_t before = read_counter_in_order();
+    const int failed = clock_gettime(clock, &now);
+    const uint64_t behind = read_counter_in_order();
+    if (failed != 0) return errno;
+    pair->width = behind - before;
+    pair->counter = before + pair->width / 2;
+    pair->ns = static_cast<int64_t>(now.tv_sec) * 1'000'000'000 + now.tv_nsec;
+    return 0;
+}
+
+int read_narrow_pair(clockid_t clock, clock_pair *pair)
+{
+    constexpr int readings = 16;
+    if (const int error = read_pair(clock, pair); error != 0) return error;
+    for (int i = 1; i < readings; ++i) {
+        clock_pair another;
+        if (read_pair(clock, &another) == 0 && another.width < pair->width) *pair = another;
+    }
+    return 0;
+}
+} // namespace qn::cu

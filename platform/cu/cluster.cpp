@@ -1,0 +1,63 @@
+// Who this host is in its cluster. No state: the files are read anew by each call, who wants to remember does so.
+#include <cerrno>
+#include <memory>
+#include <new>
+
+#include <qn_cu.h>
+
+#include "platform/common/files.h"
+#include "platform/cu/cluster_conf.h"
+
+namespace qn::cu
+{
+namespace
+{
+constexpr const char *cluster_file = "/var/qn/cfg/cluster.conf";
+constexpr const char *machine_file = "/etc/machine-id";
+constexpr size_t most_cluster_bytes = 64 << 10;
+constexpr size_t node_id_digits = 16;
+
+int read_cluster_conf(cluster_conf *conf)
+{
+    const std::unique_ptr<char[]> text(new (std::nothrow) char[most_cluster_bytes]);
+    if (!text) return ENOMEM;
+    size_t length = 0;
+    const int error = platform::read_file(cluster_file, {text.get(), most_cluster_bytes}, &length);
+    if (error == 0) *conf = parse_cluster_conf({text.get(), length});
+    return error;
+}
+
+int read_machine_id(qn_uint64_t *id)
+{
+    char digits[node_id_digits];
+    size_t length = 0;
+    const int error = platform::read_file(machine_file, digits, &length);
+    if (error != 0) return error;
+    const auto number = parse_hexadecimal({digits, length});
+    if (length != node_id_digits || !number) return ENODATA;
+    *id = *number;
+    return 0;
+}
+} // namespace
+} // namespace qn::cu
+
+int cu_get_cluster_info_1(cu_cluster_info_t *info)
+{
+    if (info == nullptr) return EINVAL;
+    qn::cu::cluster_conf conf;
+    const int error = qn::cu::read_cluster_conf(&conf);
+    *info = conf.info;
+    return error;
+}
+
+int cu_get_node_id_1(qn_uint64_t *node_id)
+{
+    if (node_id == nullptr) return EINVAL;
+    *node_id = 0;
+    qn::cu::cluster_conf conf;
+    if (qn::cu::read_cluster_conf(&conf) == 0 && conf.node_id) {
+        *node_id = *conf.node_id;
+        return 0;
+    }
+    return qn::cu::read_machine_id(node_id);
+}

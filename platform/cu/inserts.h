@@ -1,0 +1,23 @@
+// Reading the inserts of a message from a variable argument list: exactly those that its text names, never one more.
+#pragma once
+
+#include <cstdarg>
+#include <deque>
+#include <span>
+#include <string>
+#include <vector>
+
+#include <qn_cu.h>
+
+#include "platform/cu/conversions.h"
+
+namespace qn::cu
+{
+struct insert_list {
+    std::vector<cu_error_arg_t> args; // strings are still the caller's, or in `narrowed`
+    std::deque<std::string> narrowed; // wide strings, turned into multibyte text
+};
+
+// Replaces what `inserts` holds. May throw std::bad_alloc.
+void read_inserts(std::span<const passed_as> kinds, va_list arguments, insert_list &inserts);
+} // namespace qn::cu

@@ -1,0 +1,12 @@
+// The subcommands, one function each: it adds the command with its options to the parser, and leaves the exit status of
+// a run in `status`.
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+namespace qn::dump
+{
+
+void add_dump_command(CLI::App &app, int &status);
+
+} // namespace qn::dump

@@ -1,0 +1,50 @@
+// qntrace: reads what the tracing library has written.
+//
+// Data goes to standard output, everything else to standard error. Exit status: 0 all sound, 1 some file is damaged
+// (what is sound was shown), 2 wrong usage, 3 a file cannot be read or the output not be written.
+#include <clocale>
+#include <csignal>
+#include <exception>
+#include <iostream>
+
+#include <fmt/format.h>
+
+#include "tools/qntrace/commands.h"
+#include "tools/qntrace/output.h"
+
+namespace
+{
+
+int run(int argc, char **argv)
+{
+    int status = qn::dump::status_sound;
+    CLI::App app("Reads the trace files of libqn_tr.", "qntrace");
+    app.set_version_flag("--version", "qntrace " QNTRACE_VERSION, "Print the version and exit");
+    app.require_subcommand(1);
+    app.footer("Exit status: 0 all sound, 1 some file is damaged (what is sound is shown),\n"
+               "2 wrong usage, 3 a file cannot be read.");
+    qn::dump::add_dump_command(app, status);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::ParseError &error) {
+        const bool asked_for = app.exit(error, std::cout, std::cerr) == 0;
+        return asked_for ? qn::dump::status_sound : qn::dump::status_usage;
+    }
+    return status;
+}
+
+} // namespace
+
+int main(int argc, char **argv)
+{
+    // A reader that has seen enough (head, a pager) ends this program quietly, whatever its parent ignores.
+    std::signal(SIGPIPE, SIG_DFL);
+    std::setlocale(LC_CTYPE, "");
+    try {
+        return run(argc, argv);
+    } catch (const std::exception &error) {
+        // Not through write_message(), which would write the data first that may be what has failed.
+        fmt::print(stderr, "qntrace: {}\n", error.what());
+        return qn::dump::status_io_error;
+    }
+}

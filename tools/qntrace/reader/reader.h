@@ -1,0 +1,51 @@
+// The reading core as the subcommands use it: opens a trace file's bytes and yields decoded records, oldest first.
+//
+// Every finding, of the header, of the walk or of a record's body, goes to the sink before the record that it concerns
+// is delivered. Memory is bounded by the window and the longest record, time by the size of the file. Errors of the
+// file system are thrown as io_error; nothing that stands in a file makes anything be thrown.
+#pragma once
+
+#include <ctime>
+#include <optional>
+#include <string>
+
+#include "tools/qntrace/reader/decode.h"
+#include "tools/qntrace/reader/finding.h"
+#include "tools/qntrace/reader/header.h"
+#include "tools/qntrace/reader/source.h"
+#include "tools/qntrace/reader/time_base.h"
+#include "tools/qntrace/reader/walk.h"
+
+namespace qn::reader
+{
+
+struct trace_record {
+    raw_record raw;
+    record_body body;
+    std::string problem;          // why the body is not complete; empty when it is
+    std::optional<timespec> time; // absent when no usable time base is in force
+};
+
+class trace_reader
+{
+public:
+    // The source must outlive the reader.
+    trace_reader(byte_source &source, finding_sink report);
+    trace_reader(const trace_reader &) = delete;
+    trace_reader &operator=(const trace_reader &) = delete;
+
+    // Nothing when the file is not a trace file that can be read; next() then yields nothing either.
+    const std::optional<file_header> &header() const { return header_; }
+
+    // Fillers and unfinished records included. What the record refers to is valid until the next call.
+    std::optional<trace_record> next();
+
+private:
+    finding_sink report_;
+    window window_;
+    std::optional<file_header> header_;
+    std::optional<ring_walk> walk_;
+    std::optional<time_base> time_base_;
+};
+
+} // namespace qn::reader

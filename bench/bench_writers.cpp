@@ -31,12 +31,6 @@ const tr_category_description_t categories[1] = {{0, "Bench", 1, 1}};
 const std::array<char, 64> block{};
 const char *const string_32 = "0123456789abcdef0123456789abcde";
 
-struct writer {
-    const char *name;
-    size_t record_bytes; // of the same floor record
-    void (*write)();
-};
-
 cu_error_t *bench_error()
 {
     static char text[] = "bench";
@@ -44,25 +38,32 @@ cu_error_t *bench_error()
     return &error;
 }
 
-const writer writers[] = {
-    {"id", 32, [] { tr_record_id_1(component, 7); }},
-    {"values_32", 44, [] { tr_record_uint32_2_1(component, 7, 1, 2); }},
-    {"values_64", 52, [] { tr_record_uint64_2_1(component, 7, 1, 2); }},
-    {"string", 72, [] { tr_record_strings_1(component, 7, 1, string_32); }},
-    {"formatted", 52, [] { tr_record_fmt_string_1(component, 7, "%d of %d", 12, 345); }},
-    {"data", 104, [] { tr_record_data_1(component, 7, 1, block.data(), static_cast<int>(block.size())); }},
-    {"error", 88,
-     [] {
-         cu_error_t *error = bench_error();
-         tr_record_error_1(component, 7, "function", 12, nullptr, &error);
-     }},
-};
-
-void run_writer(benchmark::State &state, const writer *which)
+// Called directly, as a client calls it.
+template <auto write>
+void run_writer(benchmark::State &state)
 {
-    for (auto _ : state) which->write();
+    for (auto _ : state) write();
     state.SetItemsProcessed(state.iterations());
 }
+
+struct writer {
+    const char *name;
+    size_t record_bytes; // of the floor's record
+    void (*run)(benchmark::State &);
+};
+
+const writer writers[] = {
+    {"id", 32, run_writer<[] { tr_record_id_1(component, 7); }>},
+    {"values_32", 44, run_writer<[] { tr_record_uint32_2_1(component, 7, 1, 2); }>},
+    {"values_64", 52, run_writer<[] { tr_record_uint64_2_1(component, 7, 1, 2); }>},
+    {"string", 72, run_writer<[] { tr_record_strings_1(component, 7, 1, string_32); }>},
+    {"formatted", 52, run_writer<[] { tr_record_fmt_string_1(component, 7, "%d of %d", 12, 345); }>},
+    {"data", 104, run_writer<[] { tr_record_data_1(component, 7, 1, block.data(), static_cast<int>(block.size())); }>},
+    {"error", 88, run_writer<[] {
+         cu_error_t *error = bench_error();
+         tr_record_error_1(component, 7, "function", 12, nullptr, &error);
+     }>},
+};
 
 void run_floor(benchmark::State &state, size_t bytes)
 {
@@ -125,8 +126,7 @@ void register_benchmarks()
 {
     for (const int threads : {1, 2, 4})
         for (const writer &each : writers) {
-            auto *writing =
-                benchmark::RegisterBenchmark((std::string("writer/") + each.name).c_str(), run_writer, &each);
+            auto *writing = benchmark::RegisterBenchmark((std::string("writer/") + each.name).c_str(), each.run);
             auto *floor =
                 benchmark::RegisterBenchmark((std::string("floor/") + each.name).c_str(), run_floor, each.record_bytes);
             for (auto *one : {writing, floor}) {

@@ -20,7 +20,7 @@ inline trace_record_header_t *record_of(const unsigned char *address)
 }
 
 // Bytes of the records from the free pointer on that together come to `needed`; 0 when they are not plain, or many.
-inline qn_uint32_t plain_span(trace_anchor_t *anchor, qn_uint64_t needed)
+[[gnu::always_inline]] inline qn_uint32_t plain_span(trace_anchor_t *anchor, qn_uint64_t needed)
 {
     constexpr int most_records = 8;
     const qn_uint32_t held_by_reader = load_relaxed(header_of(anchor)->uSeqLock);
@@ -41,7 +41,8 @@ inline qn_uint32_t plain_span(trace_anchor_t *anchor, qn_uint64_t needed)
 // Makes one record of the `consumed` bytes at the free pointer, and a free rest behind it if they are more than 28 bytes
 // more than were requested. At every instant the records tile the ring: the record first covers all that was consumed,
 // and is cut to its length when the rest has its header.
-inline trace_record_header_t *claim(trace_anchor_t *anchor, qn_uint32_t consumed, unsigned int requested)
+[[gnu::always_inline]] inline trace_record_header_t *claim(trace_anchor_t *anchor, qn_uint32_t consumed,
+                                                           unsigned int requested)
 {
     trace_record_header_t *record = anchor->pNextFree;
     record->function = static_cast<qn_uint16_t>(format::kind::being_written);
@@ -77,7 +78,7 @@ inline void stamp(trace_record_header_t *record)
 }
 
 // What the writers call. A reader's request to wait, a record that is too long and a page set take the long way.
-inline trace_record_header_t *reserve(trace_anchor_t *anchor, unsigned int requested)
+[[gnu::always_inline]] inline trace_record_header_t *reserve(trace_anchor_t *anchor, unsigned int requested)
 {
     if (__builtin_expect(anchor->spool == nullptr && requested <= anchor->uMaxSize &&
                              load_relaxed(header_of(anchor)->uTailReq) == 0,

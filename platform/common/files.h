@@ -1,7 +1,8 @@
 // Reading a small file and holding its descriptor, for both libraries. No state, no lock.
 //
-// Nothing here is interrupted half-way: a signal makes a call start over, and cancellation waits until a no_cancel guard
-// goes (open, read and close would otherwise be places where the thread may end, close in a destructor even).
+// Nothing here is interrupted half-way: a signal makes a call start over, and cancellation waits until a
+// no_cancel guard goes (open, read and close would otherwise be places where the thread may end, close in a
+// destructor even).
 #pragma once
 
 #include <cerrno>

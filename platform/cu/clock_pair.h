@@ -6,8 +6,8 @@
 
 namespace qn::cu
 {
-// The counter was read before the clock and behind it; `counter` is the middle, so the clock's `ns` belongs to a counter
-// value that is at most width / 2 away.
+// The counter was read before the clock and behind it; `counter` is the middle, so the clock's `ns` belongs to
+// a counter value that is at most width / 2 away.
 struct clock_pair {
     uint64_t counter = 0;
     int64_t ns = 0;

@@ -1,4 +1,5 @@
-// Who this host is in its cluster. No state: the files are read anew by each call, who wants to remember does so.
+// Who this host is in its cluster. No state: the files are read anew by each call, who wants to remember does
+// so.
 #include <cerrno>
 #include <memory>
 #include <new>

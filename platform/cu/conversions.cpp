@@ -10,7 +10,8 @@ namespace
 // How an insert that is only skipped over ("%2$s" without "%1$...") is taken to be passed.
 constexpr passed_as unnamed = passed_as::integer;
 
-// Walks over one text. Every read_... takes what it finds at the present place; false means that it makes no sense.
+// Walks over one text. Every read_... takes what it finds at the present place; false means that it makes no
+// sense.
 class conversion_reader
 {
 public:
@@ -138,8 +139,8 @@ private:
         return length == "l" || length == "j" || length == "z" || length == "t" || length == "Z";
     }
 
-    // Gives a conversion its insert: the one at `position`, else the next. A text uses the one way or the other, and an
-    // insert is passed in one way only.
+    // Gives a conversion its insert: the one at `position`, else the next. A text uses the one way or the
+    // other, and an insert is passed in one way only.
     bool name_insert(std::optional<int> position, passed_as kind, std::optional<size_t> &insert)
     {
         if (positions_used_.value_or(position.has_value()) != position.has_value()) return false;

@@ -1,7 +1,7 @@
 // Finding the printf conversions of a message text. Pure functions, no state.
 //
-// What the parts of a text mean is settled here once; recording reads the inserts by it (inserts.h), and so does the
-// filling in of any text, a catalogue's too (render.h). A text is never handed to printf whole.
+// What the parts of a text mean is settled here once; recording reads the inserts by it (inserts.h), and so
+// does the filling in of any text, a catalogue's too (render.h). A text is never handed to printf whole.
 #pragma once
 
 #include <cstddef>

@@ -1,12 +1,12 @@
 // The counter that stamps records: the processor's time-stamp counter, or CLOCK_MONOTONIC.
 //
-// The time-stamp counter is used when it runs at one rate in every power state (the processor says so), when it is the
-// same on every processor (the kernel watches that, and lists "tsc" among its clock sources only while it holds; the
-// source in use may be another, such as a hypervisor's clock), and when this process may read it. Where any of this
-// cannot be found out the clock serves: slower, but never wrong.
+// The time-stamp counter is used when it runs at one rate in every power state (the processor says so), when it
+// is the same on every processor (the kernel watches that, and lists "tsc" among its clock sources only while
+// it holds; the source in use may be another, such as a hypervisor's clock), and when this process may read it.
+// Where any of this cannot be found out the clock serves: slower, but never wrong.
 //
-// No lock: the choice is one atomic word, constant-initialised, so that a call before the constructors of this library
-// finds it undecided and decides. Threads that decide at the same time agree on the first one's choice.
+// No lock: the choice is one atomic word, constant-initialised, so that a call before the constructors of this
+// library finds it undecided and decides. Threads that decide at the same time agree on the first one's choice.
 #include "platform/cu/counter.h"
 
 #include <algorithm>
@@ -87,15 +87,6 @@ counter_source source_of_counter()
 {
     const counter_source known = chosen.load(std::memory_order_relaxed);
     return known != counter_source::undecided ? known : decide();
-}
-
-uint64_t read_counter_in_order()
-{
-    if (source_of_counter() == counter_source::monotonic_clock) return monotonic_ns();
-    _mm_lfence();
-    const uint64_t counter = __rdtsc();
-    _mm_lfence();
-    return counter;
 }
 
 bool kernel_keeps_time_by_tsc() { return names_tsc(present_source); }

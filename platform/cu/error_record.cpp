@@ -1,9 +1,10 @@
 // The calling thread's error record. No lock: a thread touches only its own.
 //
-// The record hangs on a thread variable that needs no destructor, so that it can be used at any time: by destructors of
-// other thread variables, by exit handlers, after main. A thread-specific key, set while a thread has a record, has the
-// record released when the thread ends, cancelled or not; a record that is set later still in the end of a thread
-// arms the key again, which the system honours PTHREAD_DESTRUCTOR_ITERATIONS times.
+// The record hangs on a thread variable that needs no destructor, so that it can be used at any time: by
+// destructors of other thread variables, by exit handlers, after main. A thread-specific key, set while a
+// thread has a record, has the record released when the thread ends, cancelled or not; a record that is set
+// later still in the end of a thread arms the key again, which the system honours PTHREAD_DESTRUCTOR_ITERATIONS
+// times.
 #include <cerrno>
 #include <cstdlib>
 #include <exception>

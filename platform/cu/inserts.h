@@ -1,4 +1,5 @@
-// Reading the inserts of a message from a variable argument list: exactly those that its text names, never one more.
+// Reading the inserts of a message from a variable argument list: exactly those that its text names, never one
+// more.
 #pragma once
 
 #include <cstdarg>

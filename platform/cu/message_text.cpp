@@ -1,5 +1,5 @@
-// The message of an error, from its catalogue or its default text. No state, no lock: catopen() and the like are safe
-// in threads, and each call opens the catalogue for itself.
+// The message of an error, from its catalogue or its default text. No state, no lock: catopen() and the like
+// are safe in threads, and each call opens the catalogue for itself.
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>

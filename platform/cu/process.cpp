@@ -1,4 +1,5 @@
-// What a process can ask about itself and others: arguments, the administrative group, the signal mask. No state.
+// What a process can ask about itself and others: arguments, the administrative group, the signal mask. No
+// state.
 #include <cerrno>
 #include <csignal>
 #include <cstdio>

@@ -1,7 +1,7 @@
 // The table of the tracing library's functions, and the calls through it.
 //
-// The table is one atomic pointer, which is all that a registration beside calls needs: a call goes through the old
-// table or the new one, and both stay in memory.
+// The table is one atomic pointer, which is all that a registration beside calls needs: a call goes through the
+// old table or the new one, and both stay in memory.
 #include <atomic>
 
 #include <cu_tr_proxy.h>

@@ -1,7 +1,8 @@
 // Filling the inserts of an error record into a text. Pure functions, no state.
 //
-// Each conversion is formatted on its own, from the recorded insert and by its recorded type. So a text from outside
-// can ask for whatever it likes: what it gets is a recorded value, or the conversion stays as it is written.
+// Each conversion is formatted on its own, from the recorded insert and by its recorded type. So a text from
+// outside can ask for whatever it likes: what it gets is a recorded value, or the conversion stays as it is
+// written.
 #pragma once
 
 #include <span>

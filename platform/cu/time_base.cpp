@@ -1,8 +1,9 @@
-// The line from counter values to wall-clock time: making it from the clock, and following it. No state of its own, the
-// rate is tick_rate's.
+// The line from counter values to wall-clock time: making it from the clock, and following it. No state of its
+// own, the rate is tick_rate's.
 //
-// A line is anchored where it is made, so the rounding of its rate to whole ticks per second (2e-10 at 2.5 GHz) shows only with the
-// distance from there, 12 nanoseconds a minute, and not with the time since the counter was 0.
+// A line is anchored where it is made, so the rounding of its rate to whole ticks per second (2e-10 at 2.5 GHz)
+// shows only with the distance from there, 12 nanoseconds a minute, and not with the time since the counter was
+// 0.
 #include <cerrno>
 #include <cmath>
 #include <limits>

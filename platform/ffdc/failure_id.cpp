@@ -1,7 +1,7 @@
 // Failure identifiers. The running number is an atomic, there is nothing else to guard.
 //
-// Host, time and process make identifiers differ between hosts and processes, the running number within a process and
-// a nanosecond. A process id has at most 22 bits, which leaves 10 for the number.
+// Host, time and process make identifiers differ between hosts and processes, the running number within a
+// process and a nanosecond. A process id has at most 22 bits, which leaves 10 for the number.
 #include "platform/ffdc/failure_id.h"
 
 #include <atomic>

@@ -1,5 +1,5 @@
-// The files of /var/qn/ffdc. No lock: a record is appended by one write, and the kernel keeps such writes apart, between
-// threads and between processes.
+// The files of /var/qn/ffdc. No lock: a record is appended by one write, and the kernel keeps such writes
+// apart, between threads and between processes.
 #include "platform/ffdc/record_file.h"
 
 #include <cerrno>

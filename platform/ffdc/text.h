@@ -15,7 +15,8 @@ bytes detail_bytes(const void *data, int length);
 
 void append_hex(std::string &out, bytes data);
 
-// On one line: control characters become blanks, so that no text can pass for another line of the log. Blanks at the end go.
+// On one line: control characters become blanks, so that no text can pass for another line of the log. Blanks
+// at the end go.
 std::string one_line(std::string_view text);
 
 // The same for a C string that may be null.

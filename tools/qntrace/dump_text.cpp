@@ -12,8 +12,6 @@ namespace qn::dump
 namespace
 {
 
-namespace format = qn::tr::format;
-
 constexpr std::size_t kind_width = 11;
 constexpr std::size_t component_width = 4;
 

@@ -89,9 +89,9 @@ bool oldest_plausible(std::uint64_t oldest, const ring_bounds &ring)
 file_header parse_in_its_order(std::span<const std::byte> bytes, const finding_sink &report)
 {
     const bool little = (std::to_integer<unsigned>(bytes[0]) & format::properties::little_endian) != 0;
-    const auto named = parse(bytes, little ? byte_order::little : byte_order::big);
+    auto named = parse(bytes, little ? byte_order::little : byte_order::big);
     if (plausible(named)) return named;
-    const auto other = parse(bytes, little ? byte_order::big : byte_order::little);
+    auto other = parse(bytes, little ? byte_order::big : byte_order::little);
     if (!plausible(other)) return named;
     report({finding::severity::damage, 0,
             fmt::format("the byte-order bit 0x80 contradicts the rest of the header, which is {}-endian",

@@ -45,7 +45,7 @@ private:
     window window_;
     std::optional<file_header> header_;
     std::optional<ring_walk> walk_;
-    std::optional<time_base> time_base_;
+    std::optional<current_time_base> time_base_;
 };
 
 } // namespace qn::reader

@@ -15,10 +15,10 @@
 namespace qn::reader
 {
 
-class time_base
+class current_time_base
 {
 public:
-    explicit time_base(const cu_timeinfo_t &info) : info_(info) {}
+    explicit current_time_base(const cu_timeinfo_t &info) : info_(info) {}
 
     // Called with each record, in order, before its own time is asked for.
     void pass(const record_body &body);

@@ -1,0 +1,145 @@
+// A trace that cannot go on: its file is put aside and it starts afresh.
+#include <filesystem>
+
+#include <gtest/gtest.h>
+
+#include "files/support_files.h"
+
+namespace
+{
+using namespace qn::test;
+
+class TraceToReinitialise : public testing::Test
+{
+protected:
+    void SetUp() override { ASSERT_EQ(program.register_now(), 0); }
+    void TearDown() override
+    {
+        if (anchor != nullptr) stop(anchor);
+    }
+
+    // Starts the file and writes three ids into it.
+    void start_file(const std::string &name)
+    {
+        anchor = anchor_for(name);
+        ASSERT_EQ(start(anchor), 0) << last_error().text;
+        write_ids(anchor, 3);
+    }
+    qn_int32_t reinit()
+    {
+        const qn::tr::anchor_set_lock set(anchor);
+        return trace_reinit(anchor);
+    }
+
+    scratch folder;
+    std::string file = folder / "f";
+    client program{"ABCD"};
+    trace_anchor_t *anchor = nullptr;
+};
+
+TEST_F(TraceToReinitialise, LeavesTheOldContentsUnderItsNameWithSave)
+{
+    start_file(file);
+    const std::string before = file_bytes(file);
+    EXPECT_EQ(reinit(), 0);
+    EXPECT_EQ(file_bytes(file + ".save"), before);
+}
+
+TEST_F(TraceToReinitialise, GoesOnInAFreshFile)
+{
+    start_file(file);
+    EXPECT_EQ(reinit(), 0);
+    const auto records = trace_image::of_file(file).records();
+    ASSERT_EQ(records.size(), 1U);
+    EXPECT_EQ(records[0].function(), 16);
+    EXPECT_EQ(records[0].sequence(), 2U);
+    EXPECT_FALSE(std::filesystem::equivalent(file, file + ".save"));
+    write_ids(anchor, 2);
+    EXPECT_EQ(ids_in(file), (std::vector<uint32_t>{1, 2}));
+    EXPECT_EQ(ids_in(file + ".save"), (std::vector<uint32_t>{1, 2, 3}));
+}
+
+TEST_F(TraceToReinitialise, HasItsFlagsClearedInTheSavedFile)
+{
+    start_file(file);
+    qn::tr::header_of(anchor)->uFlags = 0x8000;
+    EXPECT_EQ(reinit(), 0);
+    EXPECT_EQ(trace_image::of_file(file + ".save").u16(4), 0) << "it was stopped cleanly";
+}
+
+TEST_F(TraceToReinitialise, ReplacesAnEarlierSavedFile)
+{
+    write_file(file + ".save", "from long ago");
+    start_file(file);
+    const std::string before = file_bytes(file);
+    EXPECT_EQ(reinit(), 0);
+    EXPECT_EQ(file_bytes(file + ".save"), before);
+}
+
+TEST_F(TraceToReinitialise, GoesOnInItsFileWhenThatCannotBeSaved)
+{
+    std::filesystem::create_directory(file + ".save");
+    start_file(file);
+    EXPECT_EQ(reinit(), 0);
+    EXPECT_EQ(ids_in(file), (std::vector<uint32_t>{1, 2, 3})) << "sound, so it was continued";
+    EXPECT_TRUE(std::filesystem::is_directory(file + ".save"));
+}
+
+TEST_F(TraceToReinitialise, ReturnsTheResultOfTheStart)
+{
+    start_file(file);
+    anchor->uRequestedFileSize = 0;
+    EXPECT_EQ(reinit(), 21);
+    EXPECT_TRUE(exists(file + ".save"));
+    EXPECT_EQ(anchor->pMap, nullptr);
+}
+
+// Nothing is stopped that has nothing to trace: the mapping goes with the saved file.
+TEST_F(TraceToReinitialise, StaysMappedWhileItIsOff)
+{
+    start_file(file);
+    program.levels[0] = 0;
+    const unsigned char *map = anchor->pMap;
+    EXPECT_EQ(reinit(), 0);
+    EXPECT_EQ(anchor->pMap, map);
+    EXPECT_TRUE(exists(file + ".save"));
+    EXPECT_FALSE(exists(file));
+}
+
+class NameOfLength : public TraceToReinitialise, public testing::WithParamInterface<size_t>
+{
+protected:
+    std::string name() const
+    {
+        std::string text = folder.folder() + "/";
+        while (text.size() + 3 <= GetParam()) text += "./";
+        return text + std::string(GetParam() - text.size(), 'f');
+    }
+};
+
+using NameWithRoom = NameOfLength;
+
+TEST_P(NameWithRoom, IsSaved)
+{
+    start_file(name());
+    EXPECT_EQ(reinit(), 0);
+    EXPECT_TRUE(exists(name() + ".save"));
+    EXPECT_TRUE(ids_in(name()).empty());
+}
+
+INSTANTIATE_TEST_SUITE_P(Lengths, NameWithRoom, testing::Values(100, 4089, 4090));
+
+using NameWithoutRoom = NameOfLength;
+
+TEST_P(NameWithoutRoom, IsNotSaved)
+{
+    start_file(name());
+    EXPECT_EQ(reinit(), 0);
+    EXPECT_EQ(ids_in(name()).size(), 3U) << "sound, so it was continued";
+    size_t files = 0;
+    for ([[maybe_unused]] const auto &entry : std::filesystem::directory_iterator(folder.folder())) ++files;
+    EXPECT_EQ(files, 1U);
+}
+
+INSTANTIATE_TEST_SUITE_P(Lengths, NameWithoutRoom, testing::Values(4091, 4092, 4095));
+} // namespace

@@ -1,0 +1,209 @@
+// Who this host is in its cluster: the text of cluster.conf, and the files themselves in a private /var.
+#include <cerrno>
+#include <filesystem>
+#include <fstream>
+#include <string>
+
+#include <gtest/gtest.h>
+#include <qn_cu.h>
+
+#include "platform/cu/cluster_conf.h"
+#include "support/private_var.h"
+#include "support/scratch.h"
+
+namespace
+{
+using qn::cu::parse_cluster_conf;
+using qn::test::in_private_var;
+
+TEST(ClusterText, GivesEveryValue)
+{
+    const auto conf =
+        parse_cluster_conf("cluster_name = production\ncluster_id = 7f3a\nnode_number = 3\nnode_id = c0ffee\n");
+    EXPECT_STREQ(conf.info.cu_cluster_name, "production");
+    EXPECT_STREQ(conf.info.cu_cluster_ID, "7f3a");
+    EXPECT_EQ(conf.info.cu_node_number, 3);
+    EXPECT_EQ(conf.node_id, 0xc0ffeeU);
+}
+
+TEST(ClusterText, IsEmptyWithoutLines)
+{
+    const auto conf = parse_cluster_conf("");
+    EXPECT_STREQ(conf.info.cu_cluster_name, "");
+    EXPECT_STREQ(conf.info.cu_cluster_ID, "");
+    EXPECT_EQ(conf.info.cu_node_number, 0);
+    EXPECT_FALSE(conf.node_id);
+}
+
+TEST(ClusterText, CommentsAndBlanksDoNotCount)
+{
+    const auto conf = parse_cluster_conf("# cluster_name = wrong\n\n \t cluster_name\t=  two words \t# remark\r\n#");
+    EXPECT_STREQ(conf.info.cu_cluster_name, "two words");
+}
+
+TEST(ClusterText, TheLastLineNeedsNoNewline)
+{
+    EXPECT_EQ(parse_cluster_conf("node_number = 12").info.cu_node_number, 12);
+}
+
+TEST(ClusterText, OfTwoLinesTheLastOneHolds)
+{
+    EXPECT_STREQ(parse_cluster_conf("cluster_name=a\ncluster_name=b\n").info.cu_cluster_name, "b");
+}
+
+TEST(ClusterText, AValueMayHoldAnEqualsSign)
+{
+    EXPECT_STREQ(parse_cluster_conf("cluster_id = a=b\n").info.cu_cluster_ID, "a=b");
+}
+
+TEST(ClusterText, ALongValueIsCut)
+{
+    const std::string name(200, 'n');
+    const auto conf = parse_cluster_conf("cluster_name = " + name + "\ncluster_id = 5\n");
+    EXPECT_EQ(conf.info.cu_cluster_name, name.substr(0, 63));
+    EXPECT_STREQ(conf.info.cu_cluster_ID, "5");
+}
+
+TEST(ClusterText, AShorterValueLeavesNothingOfALongerOne)
+{
+    const auto conf = parse_cluster_conf("cluster_id = longer\ncluster_id = x\n");
+    EXPECT_EQ(std::string(conf.info.cu_cluster_ID, 64), "x" + std::string(63, '\0'));
+}
+
+TEST(ClusterText, MalformedLinesAreIgnored)
+{
+    const auto conf =
+        parse_cluster_conf("cluster_name\n= x\nCLUSTER_NAME = y\ncluster name = z\nunknown = 1\n"
+                           "node_number = 5\nnode_number = five\nnode_number = 99999999999\n"
+                           "node_number = 6x\nnode_number =\nnode_id = xyz\nnode_id = 11112222333344445\n");
+    EXPECT_STREQ(conf.info.cu_cluster_name, "");
+    EXPECT_EQ(conf.info.cu_node_number, 5);
+    EXPECT_FALSE(conf.node_id);
+}
+
+TEST(ClusterText, ANodeIdIsHexadecimalWithOrWithoutItsPrefix)
+{
+    EXPECT_EQ(parse_cluster_conf("node_id = 0x1F\n").node_id, 31U);
+    EXPECT_EQ(parse_cluster_conf("node_id = ffffffffffffffff\n").node_id, ~qn_uint64_t{0});
+    EXPECT_EQ(parse_cluster_conf("node_id = 10\n").node_id, 16U);
+    EXPECT_FALSE(parse_cluster_conf("node_id = 0x\n").node_id);
+}
+
+TEST(ClusterText, BytesThatAreNoTextDoNoHarm)
+{
+    const std::string bytes("cluster_name = a\0b\ncluster_id\xff = \xfe\n=\n==\n\0\0", 43);
+    EXPECT_STREQ(parse_cluster_conf(bytes).info.cu_cluster_name, "a");
+}
+
+void write_conf(const std::string &text)
+{
+    std::filesystem::create_directories("/var/qn/cfg");
+    qn::test::write_file("/var/qn/cfg/cluster.conf", text);
+}
+
+TEST(Cluster, WithoutTheFileThereIsNoClusterInformation)
+{
+    EXPECT_TRUE(in_private_var([] {
+        cu_cluster_info_t info;
+        info.cu_node_number = 7;
+        info.cu_cluster_name[0] = 'x';
+        EXPECT_EQ(cu_get_cluster_info_1(&info), ENOENT);
+        EXPECT_EQ(info.cu_node_number, 0);
+        EXPECT_STREQ(info.cu_cluster_name, "");
+        return true;
+    }));
+}
+
+TEST(Cluster, TheFileGivesTheInformation)
+{
+    EXPECT_TRUE(in_private_var([] {
+        write_conf("cluster_name = production\ncluster_id = 99\nnode_number = 2\n");
+        cu_cluster_info_t info;
+        EXPECT_EQ(cu_get_cluster_info_1(&info), 0);
+        EXPECT_STREQ(info.cu_cluster_name, "production");
+        EXPECT_STREQ(info.cu_cluster_ID, "99");
+        EXPECT_EQ(info.cu_node_number, 2);
+        return true;
+    }));
+}
+
+TEST(Cluster, AChangedFileIsReadAnew)
+{
+    EXPECT_TRUE(in_private_var([] {
+        cu_cluster_info_t info;
+        write_conf("node_number = 1\n");
+        EXPECT_EQ(cu_get_cluster_info_1(&info), 0);
+        EXPECT_EQ(info.cu_node_number, 1);
+        write_conf("node_number = 2\n");
+        EXPECT_EQ(cu_get_cluster_info_1(&info), 0);
+        EXPECT_EQ(info.cu_node_number, 2);
+        return true;
+    }));
+}
+
+TEST(Cluster, AFolderInPlaceOfTheFileIsAnError)
+{
+    EXPECT_TRUE(in_private_var([] {
+        std::filesystem::create_directories("/var/qn/cfg/cluster.conf");
+        cu_cluster_info_t info;
+        EXPECT_EQ(cu_get_cluster_info_1(&info), EISDIR);
+        return true;
+    }));
+}
+
+TEST(Cluster, TheFilesNodeIdIsPreferred)
+{
+    EXPECT_TRUE(in_private_var([] {
+        write_conf("node_id = 00c0ffee00c0ffee\n");
+        qn_uint64_t id = 0;
+        EXPECT_EQ(cu_get_node_id_1(&id), 0);
+        EXPECT_EQ(id, 0x00c0ffee00c0ffeeU);
+        return true;
+    }));
+}
+
+// The first 16 digits of /etc/machine-id, or nothing where there is none.
+std::string machine_digits()
+{
+    std::ifstream file("/etc/machine-id");
+    std::string digits;
+    file >> digits;
+    return digits.size() >= 16 ? digits.substr(0, 16) : "";
+}
+
+void expect_machine_id()
+{
+    qn_uint64_t id = 77;
+    const int result = cu_get_node_id_1(&id);
+    if (machine_digits().empty()) {
+        EXPECT_NE(result, 0);
+        EXPECT_EQ(id, 0U);
+    } else {
+        EXPECT_EQ(result, 0);
+        EXPECT_EQ(id, std::stoull(machine_digits(), nullptr, 16));
+    }
+}
+
+TEST(Cluster, WithoutTheFileTheNodeIdComesFromTheMachine)
+{
+    EXPECT_TRUE(in_private_var([] {
+        expect_machine_id();
+        return true;
+    }));
+}
+
+TEST(Cluster, AFileWithoutANodeIdLeavesItToTheMachine)
+{
+    EXPECT_TRUE(in_private_var([] {
+        write_conf("cluster_name = x\nnode_id = nonsense\n");
+        expect_machine_id();
+        return true;
+    }));
+}
+
+TEST(Cluster, NullPointersAreRefused)
+{
+    EXPECT_EQ(cu_get_cluster_info_1(nullptr), EINVAL);
+    EXPECT_EQ(cu_get_node_id_1(nullptr), EINVAL);
+}
+} // namespace

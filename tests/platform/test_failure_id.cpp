@@ -1,0 +1,65 @@
+// Failure identifiers.
+#include <cctype>
+#include <ctime>
+#include <mutex>
+#include <set>
+#include <string>
+#include <thread>
+#include <unistd.h>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "platform/ffdc/failure_id.h"
+
+namespace
+{
+std::string new_id()
+{
+    fc_eid_t id;
+    qn::ffdc::make_failure_id(id);
+    return id;
+}
+
+TEST(FailureId, Has42CharactersInThreeGroups)
+{
+    const std::string id = new_id();
+    ASSERT_EQ(id.size(), 42U);
+    for (size_t i = 0; i < id.size(); ++i) {
+        if (i == 16 || i == 33) {
+            EXPECT_EQ(id[i], '.');
+        } else {
+            EXPECT_TRUE(std::isxdigit(static_cast<unsigned char>(id[i]))) << id;
+        }
+    }
+}
+
+TEST(FailureId, TellsTimeAndProcess)
+{
+    const time_t before = time(nullptr);
+    const std::string id = new_id();
+    const auto seconds = static_cast<time_t>(std::stoull(id.substr(17, 16), nullptr, 16) / 1'000'000'000);
+    EXPECT_GE(seconds, before);
+    EXPECT_LE(seconds, time(nullptr));
+    EXPECT_EQ(std::stoul(id.substr(34), nullptr, 16) >> 10, static_cast<unsigned long>(getpid()));
+}
+
+TEST(FailureId, NamesTheSameHostEachTime) { EXPECT_EQ(new_id().substr(0, 16), new_id().substr(0, 16)); }
+
+TEST(FailureId, IsNeverGivenTwice)
+{
+    std::set<std::string> ids;
+    std::mutex guard;
+    std::vector<std::thread> threads;
+    for (int t = 0; t < 4; ++t)
+        threads.emplace_back([&] {
+            for (int i = 0; i < 250; ++i) {
+                const std::string id = new_id();
+                const std::lock_guard lock(guard);
+                ids.insert(id);
+            }
+        });
+    for (std::thread &thread : threads) thread.join();
+    EXPECT_EQ(ids.size(), 1000U);
+}
+} // namespace

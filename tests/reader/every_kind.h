@@ -1,0 +1,11 @@
+// A file with every record kind, for the tests of the formats.
+#pragma once
+
+#include "reader/trace_builder.h"
+
+namespace qn::test
+{
+
+trace_builder every_kind();
+
+} // namespace qn::test

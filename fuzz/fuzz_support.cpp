@@ -9,7 +9,7 @@ namespace qn::fuzz
 input read_input(const uint8_t *data, size_t size)
 {
     constexpr size_t most_bytes = 512;
-    constexpr auto most_repetitions = 4;
+    constexpr auto most_repetitions = 2;
     const auto *end = std::find(data, data + std::min(size, most_bytes), 0);
     std::string text(data, end);
 

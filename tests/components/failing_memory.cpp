@@ -27,6 +27,8 @@ bool fails(size_t bytes)
 }
 } // namespace
 
+// Visible, because the linker looks at the shared libraries' calls too.
+#pragma GCC visibility push(default)
 extern "C" {
 void *__real_calloc(size_t count, size_t bytes);
 void *__real_malloc(size_t bytes);
@@ -44,6 +46,7 @@ int __wrap_regcomp(regex_t *regex, const char *pattern, int flags)
     return __real_regcomp(regex, pattern, flags);
 }
 }
+#pragma GCC visibility pop
 
 namespace qn::test
 {

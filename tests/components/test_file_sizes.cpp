@@ -189,6 +189,7 @@ TEST(FileSize, FailsWhenTheAnchorsMutexCannotBeTaken)
     outcome set;
     outcome got;
     {
+        const qn::tr::global_lock first_in_order;
         const exhausted_mutex exhausted(anchor->anchorMutex);
         set = after(tr_set_file_size_1("/tmp/a.trc", 99));
         got = after(tr_get_file_size_1("/tmp/a.trc", &size));

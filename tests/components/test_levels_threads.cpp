@@ -15,8 +15,6 @@ namespace
 {
 using namespace qn::test;
 
-constexpr qn_uint32_t turns = 200; // every specification is kept, and applied at each registration
-
 // One client's life, over and over: what it writes depends on levels that others set meanwhile.
 void live(int number, const std::atomic<bool> &enough, std::atomic<int> &failures)
 {
@@ -70,6 +68,7 @@ TEST(LevelThreads, SetLevelsWhileEightThreadsRegisterAndWrite)
         eight_clients clients;
         const std::array<const char *, 5> specifications = {"*:*=1", "T[0-3]:*=2", "*:c[12]=0", "T:*", "STAY:*=5"};
         int failures = 0;
+        constexpr qn_uint32_t turns = 200; // every specification is kept, and applied at each registration
         for (qn_uint32_t turn = 0; turn < turns; ++turn)
             failures += tr_set_trace_levels_1(specifications[turn % specifications.size()]) != 0 ? 1 : 0;
         clients.end();
@@ -95,7 +94,7 @@ TEST(LevelThreads, MapSizeFlushAndLookWhileEightThreadsRegisterAndWrite)
     {
         eight_clients clients;
         int failures = 0;
-        for (qn_uint32_t turn = 0; turn < turns; ++turn) {
+        for (qn_uint32_t turn = 0; turn < 40; ++turn) {
             qn_uint32_t size = 0;
             int count = 0;
             tr_mini_component_anchor_t *snapshot = nullptr;
@@ -125,7 +124,7 @@ TEST(LevelThreads, KeepPagesResidentWhileEightThreadsRegisterAndWrite)
     ASSERT_EQ(tr_set_file_map_1((files / "b.trc").c_str(), "T:c[12]"), 0); // a file with a lock of its own
     eight_clients clients;
     int failures = 0;
-    for (qn_uint32_t turn = 0; turn < turns; ++turn) {
+    for (qn_uint32_t turn = 0; turn < 40; ++turn) {
         failures += tr_pin_pages_1(1) != 0 ? 1 : 0;
         failures += tr_flush_1() != 0 ? 1 : 0;
         failures += tr_pin_pages_1(0) != 0 ? 1 : 0;

@@ -1,5 +1,5 @@
 // Page anchors: how their names are matched, what they take from their head, and how a page set is looked up.
-#include <sstream>
+#include <cstdlib>
 
 #include <gtest/gtest.h>
 
@@ -70,15 +70,23 @@ protected:
         head->pSpoolMutex = &shared;
         head->pActivePg = head;
     }
+    void TearDown() override
+    {
+        if (page == nullptr) return;
+        pthread_mutex_destroy(&page->anchorMutex);
+        std::free(page);
+        head->nextPage = nullptr;
+    }
 
     trace_spool_spec_t spool{};
     pthread_mutex_t shared;
     trace_anchor_t *head = nullptr;
+    trace_anchor_t *page = nullptr; // one that the test has made
 };
 
 TEST_F(PageAnchor, TakesSizesSpecificationAndMutexFromTheHead)
 {
-    const trace_anchor_t *page = getSplAnchor(head, "/tmp/t.2.sp");
+    page = getSplAnchor(head, "/tmp/t.2.sp");
     ASSERT_NE(page, nullptr);
     EXPECT_STREQ(page->fileName, "/tmp/t.2.sp");
     EXPECT_EQ(page->uMaxSize, head->uMaxSize);
@@ -90,7 +98,7 @@ TEST_F(PageAnchor, TakesSizesSpecificationAndMutexFromTheHead)
 
 TEST_F(PageAnchor, PointsAtTheHeadsActivePage)
 {
-    const trace_anchor_t *page = getSplAnchor(head, "/tmp/t.2.sp");
+    page = getSplAnchor(head, "/tmp/t.2.sp");
     ASSERT_NE(page, nullptr);
     EXPECT_EQ(page->pActivePg, nullptr);
     EXPECT_EQ(page->ppActivePg, &head->pActivePg);
@@ -102,7 +110,7 @@ TEST_F(PageAnchor, PointsAtTheHeadsActivePage)
 
 TEST_F(PageAnchor, IsNotInTheListOfTraceFiles)
 {
-    const trace_anchor_t *page = getSplAnchor(head, "/tmp/t.2.sp");
+    page = getSplAnchor(head, "/tmp/t.2.sp");
     ASSERT_NE(page, nullptr);
     EXPECT_EQ(anchors.numAnchors, 2U);
     EXPECT_EQ(findOrCreateAnchorForFile("/tmp/t.2.sp", 0), nullptr);
@@ -136,8 +144,6 @@ protected:
         head->nextPage = page;
         page->nextPage = head;
     }
-
-    trace_anchor_t *page = nullptr;
 };
 
 TEST_F(PageSetLookUp, FindsTheHeadByTheNameOfTheTrace)

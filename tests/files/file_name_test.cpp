@@ -201,7 +201,11 @@ protected:
         ASSERT_NE(anchors.nextPage, nullptr);
         ASSERT_NE(anchors.nextPage, &anchors);
     }
-    void TearDown() override { EXPECT_EQ(tr_set_filename_1(nullptr), 0); }
+    void TearDown() override
+    {
+        EXPECT_EQ(tr_set_filename_1(nullptr), 0);
+        anchors.spool = nullptr;
+    }
 
     client program{"ABCD"};
 };

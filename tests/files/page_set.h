@@ -20,7 +20,9 @@ protected:
     }
     ~PageSet() override
     {
-        if (head != nullptr) stop(head);
+        if (head == nullptr) return;
+        stop(head);
+        head->spool = nullptr;
     }
 
     // Binds the trace to the specification; nothing is started.

@@ -13,6 +13,8 @@ int calls_to_failure = 0;
 int failure = 0;
 } // namespace
 
+// Visible, because the linker looks at the shared libraries' calls too.
+#pragma GCC visibility push(default)
 extern "C" {
 int __real_msync(void *address, size_t bytes, int flags);
 
@@ -30,6 +32,7 @@ int __wrap_msync(void *address, size_t bytes, int flags)
     return __real_msync(address, bytes, flags);
 }
 }
+#pragma GCC visibility pop
 
 namespace qn::test
 {

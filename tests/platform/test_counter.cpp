@@ -1,4 +1,6 @@
 // The counter: usable at any time, never going back, the same choice for everybody.
+#include <cstdlib>
+#include <sys/mount.h>
 #include <thread>
 #include <vector>
 
@@ -7,6 +9,7 @@
 
 #include "platform/cu/clock_pair.h"
 #include "platform/cu/counter.h"
+#include "support/private_var.h"
 
 namespace
 {
@@ -64,6 +67,16 @@ TEST(Counter, ThreadsAgreeOnItsSource)
         EXPECT_NE(source, qn::cu::counter_source::undecided);
         EXPECT_EQ(source, seen[0]);
     }
+}
+
+TEST(Counter, IsTheMonotonicClockWhereTheTimeStampCounterIsNotTrusted)
+{
+    EXPECT_TRUE(qn::test::in_private_var([] {
+        // An empty list of clock sources names no time-stamp counter.
+        constexpr const char *clock_sources = "/sys/devices/system/clocksource";
+        if (mount("tmpfs", clock_sources, "tmpfs", 0, nullptr) != 0) return false;
+        return std::system(QN_MONOTONIC_COUNTER) == 0;
+    }));
 }
 
 TEST(Counter, PairsOfCounterAndClockGrowTogether)

@@ -1,6 +1,6 @@
 // Failure identifiers.
 #include <cctype>
-#include <ctime>
+#include <chrono>
 #include <mutex>
 #include <set>
 #include <string>
@@ -36,11 +36,12 @@ TEST(FailureId, Has42CharactersInThreeGroups)
 
 TEST(FailureId, TellsTimeAndProcess)
 {
-    const time_t before = time(nullptr);
+    const auto now = [] { return std::chrono::system_clock::now().time_since_epoch() / std::chrono::nanoseconds(1); };
+    const auto before = now();
     const std::string id = new_id();
-    const auto seconds = static_cast<time_t>(std::stoull(id.substr(17, 16), nullptr, 16) / 1'000'000'000);
-    EXPECT_GE(seconds, before);
-    EXPECT_LE(seconds, time(nullptr));
+    const auto time = std::stoll(id.substr(17, 16), nullptr, 16);
+    EXPECT_GE(time, before);
+    EXPECT_LE(time, now());
     EXPECT_EQ(std::stoul(id.substr(34), nullptr, 16) >> 10, static_cast<unsigned long>(getpid()));
 }
 

@@ -11,6 +11,7 @@
 #include <gtest/gtest.h>
 #include <qn_cu.h>
 
+#include "instrumented.h"
 #include "platform/cu/clock_pair.h"
 
 namespace
@@ -74,6 +75,7 @@ int64_t largest_error_ns(const cu_timeinfo_t &base, const std::vector<clock_pair
 
 TEST(OneMinute, EveryTimeBaseKeepsWithinAMicrosecondOfTheClock)
 {
+    if (instrumented) GTEST_SKIP() << "the readings are too uneven in an instrumented build";
     cu_timeinfo_t first{};
     ASSERT_EQ(cu_get_procspeed_1(&first), 0);
     const steering before = present_steering();

@@ -19,6 +19,8 @@ qn_int32_t count_flush()
     return 32;
 }
 
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral" // it is somebody else's format
 qn_int32_t keep_text(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat, va_list arguments)
 {
     char text[100];
@@ -26,6 +28,7 @@ qn_int32_t keep_text(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_cha
     written = std::string(pCompId) + "/" + std::to_string(traceId) + "/" + text;
     return 33;
 }
+#pragma GCC diagnostic pop
 
 constexpr tr_proxy_func_table_t both{.p_tr_flush = count_flush, .p_tr_record_vfmt_string = keep_text};
 constexpr tr_proxy_func_table_t neither{.p_tr_flush = nullptr, .p_tr_record_vfmt_string = nullptr};

@@ -30,6 +30,8 @@ int fail_with(const failure &how)
 }
 } // namespace
 
+// Visible, because the linker looks at the shared libraries' calls too.
+#pragma GCC visibility push(default)
 extern "C" {
 int __real_open(const char *name, int flags, ...);
 int __real_fstat(int fd, struct stat *file);
@@ -71,6 +73,7 @@ void *__wrap_mmap(void *address, size_t bytes, int protection, int flags, int fd
     return MAP_FAILED;
 }
 }
+#pragma GCC visibility pop
 
 namespace qn::test
 {

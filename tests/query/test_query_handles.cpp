@@ -196,7 +196,7 @@ TEST(QueryHandle, IsRefusedWithoutItsFourBytes)
         none.fd = -1;
         expect_refusal(&none);
     }
-    char only_four[4] = {'N', 'O', 'P', 'E'}; // nothing behind them is looked at
+    alignas(trace_query_anchor_t) char only_four[4] = {'N', 'O', 'P', 'E'}; // nothing behind them is looked at
     expect_refusal(reinterpret_cast<tr_query_handle_t>(only_four));
 }
 } // namespace

@@ -20,6 +20,7 @@ namespace
 std::vector<char *> pointers_to(const std::vector<std::string> &strings)
 {
     std::vector<char *> result;
+    result.reserve(strings.size() + 1);
     for (const auto &string : strings) {
         result.push_back(const_cast<char *>(string.c_str()));
     }
@@ -34,10 +35,10 @@ void open_as(int descriptor, const std::string &path)
     close(opened);
 }
 
-[[noreturn]] void become_qntrace(std::vector<std::string> arguments, const surroundings &around, const std::string &out,
-                                 const std::string &err)
+[[noreturn]] void become(const std::string &program, std::vector<std::string> arguments, const surroundings &around,
+                         const std::string &out, const std::string &err)
 {
-    arguments.insert(arguments.begin(), "qntrace");
+    arguments.insert(arguments.begin(), program);
     open_as(STDERR_FILENO, err);
     if (around.nobody_reads) {
         int ends[2];
@@ -49,20 +50,20 @@ void open_as(int descriptor, const std::string &path)
     }
     if (around.ignore_sigpipe) std::signal(SIGPIPE, SIG_IGN);
     if (around.as_nobody && geteuid() == 0 && (setgid(65534) != 0 || setuid(65534) != 0)) _exit(126);
-    execve(QNTRACE_PROGRAM, pointers_to(arguments).data(), pointers_to(around.environment).data());
+    execve(program.c_str(), pointers_to(arguments).data(), pointers_to(around.environment).data());
     _exit(127);
 }
 
 } // namespace
 
-outcome run_qntrace(const std::vector<std::string> &arguments, const surroundings &around)
+outcome run_program(const std::string &program, const std::vector<std::string> &arguments, const surroundings &around)
 {
     const scratch_folder folder;
     const auto out = around.out_file.empty() ? folder.path("out") : around.out_file;
     const auto err = folder.path("err");
     const pid_t child = fork();
     if (child < 0) throw std::runtime_error("fork() failed");
-    if (child == 0) become_qntrace(arguments, around, out, err);
+    if (child == 0) become(program, arguments, around, out, err);
     int status = 0;
     if (waitpid(child, &status, 0) != child) throw std::runtime_error("waitpid() failed");
     outcome result;
@@ -71,6 +72,11 @@ outcome run_qntrace(const std::vector<std::string> &arguments, const surrounding
     if (around.out_file.empty() && !around.nobody_reads) result.out = contents_of(out);
     result.err = contents_of(err);
     return result;
+}
+
+outcome run_qntrace(const std::vector<std::string> &arguments, const surroundings &around)
+{
+    return run_program(QNTRACE_PROGRAM, arguments, around);
 }
 
 scratch_folder::scratch_folder()

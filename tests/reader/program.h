@@ -1,4 +1,4 @@
-// Runs the real command and catches what it does.
+// Runs the real command, or another program, and catches what it does.
 #pragma once
 
 #include <cstddef>
@@ -25,6 +25,8 @@ struct surroundings {
     bool nobody_reads = false;   // standard output is a pipe without a reader
 };
 
+outcome run_program(const std::string &program, const std::vector<std::string> &arguments,
+                    const surroundings &around = {});
 outcome run_qntrace(const std::vector<std::string> &arguments, const surroundings &around = {});
 
 // A folder of its own that goes with it.

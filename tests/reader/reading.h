@@ -1,7 +1,9 @@
 // Reads a trace in memory to its end, and keeps what came out.
 #pragma once
 
+#include <cstdint>
 #include <optional>
+#include <span>
 #include <string>
 #include <vector>
 

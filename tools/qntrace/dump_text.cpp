@@ -121,8 +121,12 @@ void text_dump::record(std::string &out, const reader::trace_record &record)
 
 void text_dump::time_column(std::string &out, const reader::trace_record &record)
 {
-    const auto text = record.time ? timestamps_.text(*record.time) : std::nullopt;
-    append(out, "{:<{}}", text ? *text : fmt::format("counter {}", record.raw.header.counter), timestamps_.width());
+    std::string text = "-";
+    if (!std::holds_alternative<reader::free_body>(record.body)) {
+        const auto time = record.time ? timestamps_.text(*record.time) : std::nullopt;
+        text = time ? *time : fmt::format("counter {}", record.raw.header.counter);
+    }
+    append(out, "{:<{}}", text, timestamps_.width());
 }
 
 void text_dump::component_column(std::string &out, const reader::record_header &header) const

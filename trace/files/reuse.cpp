@@ -66,10 +66,8 @@ public:
     // Null when the ring is sound, else what is wrong with it.
     const char *find_damage()
     {
-        // No version has a longer header than this one.
-        if (ring_start_ < smallest_ring_offset(header_->uVersion) || ring_start_ > format::header_bytes)
+        if (ring_start_ < smallest_ring_offset(header_->uVersion) || !has_room_for_record(oldest_))
             return "corruption 1";
-        if (!has_room_for_record(oldest_)) return "corruption 1";
         qn_uint64_t offset = oldest_;
         for (qn_uint32_t records = 0; records <= size_ / record_header_bytes; ++records) {
             const qn_uint64_t at = offset;

@@ -37,7 +37,7 @@ trace_anchor_t *anchor_being_opened(int fd)
 }
 
 // Undoes everything unless the start came to its end: on a failure as on a cancellation, the descriptor is closed and
-// the anchor stays unmapped.
+// the anchor stays unmapped. Only a cancellation leaves descriptor 0 open.
 class start_in_progress
 {
 public:
@@ -55,8 +55,13 @@ public:
     void opened(int fd) { anchor_->mapFd = fd_ = fd; }
     void close_descriptor()
     {
-        close(fd_);
+        if (fd_ != -1) close(fd_);
         anchor_->mapFd = fd_ = -1;
+    }
+    qn_int32_t failed(qn_int32_t status)
+    {
+        close_descriptor();
+        return status;
     }
     void done() { done_ = true; }
 
@@ -103,7 +108,10 @@ void give_to_administrators(int fd)
 {
     gid_t group = 0;
     if (cu_getadmin_group_id_1(&group) != 0) return;
-    if (fchown(fd, static_cast<uid_t>(-1), group) != 0 || fchmod(fd, 0660) != 0) return;
+    const int changed_group = fchown(fd, static_cast<uid_t>(-1), group);
+    const int changed_mode = fchmod(fd, 0660);
+    (void)changed_group;
+    (void)changed_mode;
 }
 
 qn_int32_t map_file_at_size(trace_anchor_t *anchor, start_in_progress &start, qn_uint32_t size)
@@ -176,10 +184,10 @@ qn_int32_t start_trace_page(trace_anchor_t *anchor)
     start_in_progress start(anchor);
 
     qn_int32_t status = open_file(anchor, start);
-    if (status != 0) return status;
+    if (status != 0) return start.failed(status);
     qn_uint64_t current_size = 0;
     status = check_file(anchor, start.fd(), current_size);
-    if (status != 0) return status;
+    if (status != 0) return start.failed(status);
 
     const auto page_size = static_cast<qn_uint32_t>(anchor->pageSize);
     qn_uint32_t size = page_size * ((anchor->uRequestedFileSize + page_size - 1) / page_size);
@@ -188,13 +196,13 @@ qn_int32_t start_trace_page(trace_anchor_t *anchor)
         debug("\ttrace: uSize(%llu) != statData.st_size(%llu) for %s\n", static_cast<unsigned long long>(size),
               static_cast<unsigned long long>(current_size), anchor->fileName);
         status = extend_trace_file(start.fd(), current_size, page_size, size);
-        if (status != 0) return status;
+        if (status != 0) return start.failed(status);
         debug("\ttrace: reInit for %s due to size\n", anchor->fileName);
     }
 
     give_to_administrators(start.fd());
     status = map_file_at_size(anchor, start, size);
-    if (status != 0) return status;
+    if (status != 0) return start.failed(status);
 
     const program_names names = names_of_this_program();
     if (resized || !reuse_ring(anchor, names)) {

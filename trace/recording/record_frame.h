@@ -63,10 +63,11 @@ inline qn_int32_t write_record(const qn_char_t *comp_id, tr_file_token_t token, 
     const anchor_set_lock set(anchor);
     if (!set) return QN_TR_ELOCK;
     status = writer.check_locked(anchor);
-    if (status != 0 || anchor->uMaxSize == 0) return status;
+    // Not even the fixed part fits: the trace is not active, or its ring is tiny.
+    if (status != 0 || anchor->uMaxSize < sizeof(typename Writer::record)) return status;
     unsigned int length = 0;
     status = writer.size(anchor, length);
-    if (status != 0) return status;
+    if (status != 0) return status == nothing_to_write ? 0 : status;
 
     trace_record_header_t *header = reserve(anchor, length);
     if (header == nullptr) return 0;

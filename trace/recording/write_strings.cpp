@@ -92,6 +92,7 @@ struct formatted_writer : record_writer {
 #pragma GCC diagnostic ignored "-Wformat-nonliteral" // the exported calls check the client's format
     qn_int32_t size(trace_anchor_t *anchor, unsigned int &length)
     {
+        if (anchor->uMaxSize == sizeof(record)) return nothing_to_write; // no room for a terminator
         if (std::vsnprintf(anchor->buffer, sizeof anchor->buffer, format, arguments) < 0) return QN_TR_EFORMAT;
         text = anchor->buffer;
         text_size = static_cast<qn_uint32_t>(std::strlen(text)) + 1;

@@ -34,7 +34,8 @@ std::optional<trace_record> trace_reader::next()
                  fmt::format("{} (sequence number {})", record.problem, raw->header.seq)});
     }
     time_base_->pass(record.body);
-    record.time = time_base_->time_of(raw->header.counter);
+    // A filler's header beyond its length, kind and sequence number is what happened to stand there.
+    if (!std::holds_alternative<free_body>(record.body)) record.time = time_base_->time_of(raw->header.counter);
     return record;
 }
 

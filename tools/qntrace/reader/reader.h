@@ -23,7 +23,7 @@ struct trace_record {
     raw_record raw;
     record_body body;
     std::string problem;          // why the body is not complete; empty when it is
-    std::optional<timespec> time; // absent when no usable time base is in force
+    std::optional<timespec> time; // absent for a filler, and when no usable time base is in force
 };
 
 class trace_reader

@@ -8,5 +8,6 @@ namespace qn::dump
 {
 
 void add_dump_command(CLI::App &app, int &status);
+void add_info_command(CLI::App &app, int &status);
 
 } // namespace qn::dump

@@ -10,6 +10,7 @@
 #include "tools/qntrace/commands.h"
 #include "tools/qntrace/dump_json.h"
 #include "tools/qntrace/dump_text.h"
+#include "tools/qntrace/findings.h"
 #include "tools/qntrace/output.h"
 #include "tools/qntrace/reader/reader.h"
 
@@ -23,45 +24,6 @@ struct dump_options {
     bool raw = false;
     bool utc = false;
     std::vector<std::string> files;
-};
-
-std::string printable_name(const std::string &path)
-{
-    std::string name;
-    append_escaped(name, path, locale_charset());
-    return name;
-}
-
-// Tells what the reading core finds in one file. A file of rubbish may have a finding in every 28 bytes; nobody reads
-// more than the first of them.
-class finding_printer
-{
-public:
-    explicit finding_printer(const std::string &path) : name_(printable_name(path)) {}
-
-    void operator()(const reader::finding &found)
-    {
-        if (found.level == reader::finding::severity::damage) damaged_ = true;
-        if (++count_ > most_shown) return;
-        const auto where = found.offset ? fmt::format("offset {}: ", *found.offset) : std::string();
-        write_message(fmt::format("{}: {}{}", name_, where, found.text));
-    }
-
-    void finish() const
-    {
-        if (count_ > most_shown) {
-            write_message(fmt::format("{}: {} more problems are not shown", name_, count_ - most_shown));
-        }
-    }
-
-    int status() const { return damaged_ ? status_damaged : status_sound; }
-
-private:
-    static constexpr std::uint64_t most_shown = 100;
-
-    std::string name_;
-    std::uint64_t count_ = 0;
-    bool damaged_ = false;
 };
 
 bool carries_data(const reader::record_body &body)

@@ -28,14 +28,6 @@ std::string_view order_name(reader::byte_order order)
     return order == reader::byte_order::little ? "little-endian" : "big-endian";
 }
 
-// The zone offset is stored as minutes west of Greenwich; nonsense is left as the number it is.
-std::string zone_text(std::int32_t minutes_west)
-{
-    if (minutes_west < -24 * 60 || minutes_west > 24 * 60) return fmt::format("{} minutes west", minutes_west);
-    const int minutes = std::abs(minutes_west);
-    return fmt::format("UTC{}{:02}:{:02}", minutes_west > 0 ? '-' : '+', minutes / 60, minutes % 60);
-}
-
 } // namespace
 
 void text_dump::header(std::string &out, std::string_view path, const reader::file_header &header)

@@ -24,6 +24,7 @@ int run(int argc, char **argv)
     app.footer("Exit status: 0 all sound, 1 some file is damaged (what is sound is shown),\n"
                "2 wrong usage, 3 a file cannot be read.");
     qn::dump::add_dump_command(app, status);
+    qn::dump::add_info_command(app, status);
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError &error) {

@@ -2,6 +2,7 @@
 
 #include <array>
 #include <bit>
+#include <cstdlib>
 
 #include <fmt/format.h>
 
@@ -47,6 +48,13 @@ std::string argument_value(const reader::error_argument &argument)
     case argument_type::double_value: return fmt::format("{}", std::bit_cast<double>(argument.bits));
     default: return fmt::format("{:#x}", argument.bits);
     }
+}
+
+std::string zone_text(std::int32_t minutes_west)
+{
+    if (minutes_west < -24 * 60 || minutes_west > 24 * 60) return fmt::format("{} minutes west", minutes_west);
+    const int minutes = std::abs(minutes_west);
+    return fmt::format("UTC{}{:02}:{:02}", minutes_west > 0 ? '-' : '+', minutes / 60, minutes % 60);
 }
 
 std::string_view component_name(const reader::record_header &header)

@@ -1,0 +1,258 @@
+// qntrace info: what a trace file is and what it holds, without its records.
+//
+// Who wrote it is asked through the library's query interface; everything else comes from the reading core, which walks
+// the ring once.
+#include <algorithm>
+#include <cstdlib>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include <fmt/format.h>
+#include <nlohmann/json.hpp>
+#include <qn_tr.h>
+
+#include "tools/qntrace/commands.h"
+#include "tools/qntrace/escape.h"
+#include "tools/qntrace/findings.h"
+#include "tools/qntrace/output.h"
+#include "tools/qntrace/reader/reader.h"
+#include "tools/qntrace/record_names.h"
+#include "tools/qntrace/timestamps.h"
+
+namespace qn::dump
+{
+namespace
+{
+
+using json = nlohmann::ordered_json;
+
+struct info_options {
+    bool json = false;
+    bool utc = false;
+    std::vector<std::string> files;
+};
+
+struct query_answer {
+    pid_t pid = 0;
+    std::string program;
+    std::uint32_t platform = 0;
+};
+
+// The first or last record that carries data.
+struct record_seen {
+    std::uint32_t sequence = 0;
+    std::optional<timespec> time;
+};
+
+struct ring_contents {
+    std::uint64_t records = 0;
+    std::uint64_t unfinished = 0;
+    std::uint64_t lost = 0;
+    std::optional<record_seen> oldest;
+    std::optional<record_seen> newest;
+};
+
+// The calling thread's error, as the library words it.
+std::string library_message()
+{
+    cu_error_t *error = nullptr;
+    char *text = nullptr;
+    std::string message = "the query failed";
+    if (cu_get_error_1(&error) == 0 && cu_get_errmsg_1(error, &text) == 0) message = text;
+    std::free(text);
+    cu_rel_error_1(error);
+    while (message.ends_with('\n')) message.pop_back();
+    return message;
+}
+
+// Nothing when the library cannot open the file; `status` says then how bad that is.
+std::optional<query_answer> ask_library(const std::string &path, int &status)
+{
+    tr_query_handle_t handle = nullptr;
+    const int opened = tr_open_query_1(path.c_str(), &handle);
+    if (opened != 0) {
+        write_message(fmt::format("{}: {}", printable_name(path), library_message()));
+        status = opened == QN_TR_ENOTTRACE ? status_damaged : status_io_error;
+        return std::nullopt;
+    }
+    query_answer answer;
+    qn_char_t *program = nullptr;
+    tr_query_pid_1(handle, &answer.pid);
+    tr_query_platform_1(handle, &answer.platform);
+    if (tr_query_prog_1(handle, &program) == 0) answer.program = program;
+    std::free(program);
+    tr_close_query_1(handle);
+    return answer;
+}
+
+// A ring's sequence numbers start at 2 and go up by 2, so that the oldest one tells how many came before it: records that
+// were overwritten, and the fillers that closed off the end of the file each time it was reached.
+std::uint64_t lost_before(std::uint32_t oldest_sequence) { return oldest_sequence > 2 ? (oldest_sequence - 2) / 2 : 0; }
+
+ring_contents look_through(reader::trace_reader &trace)
+{
+    ring_contents contents;
+    while (const auto record = trace.next()) {
+        if (std::holds_alternative<reader::free_body>(record->body)) continue;
+        if (std::holds_alternative<reader::unfinished_body>(record->body)) {
+            ++contents.unfinished;
+            continue;
+        }
+        const record_seen seen{record->raw.header.seq, record->time};
+        if (!contents.oldest && !std::holds_alternative<reader::page_note_body>(record->body)) {
+            contents.oldest = seen;
+            contents.lost = lost_before(seen.sequence);
+        }
+        contents.newest = seen;
+        ++contents.records;
+    }
+    return contents;
+}
+
+std::string escaped(std::string_view text)
+{
+    std::string out;
+    append_quoted(out, text, locale_charset());
+    return out;
+}
+
+std::string page_text(const reader::file_header &header)
+{
+    const auto state = header.page_state.value_or(0);
+    if (state == 0) return "none: a trace of a single file";
+    const auto name = page_state_name(state);
+    return name.empty() ? fmt::format("state {}", state) : std::string(name);
+}
+
+class info_text
+{
+public:
+    explicit info_text(bool utc) : times_(utc) {}
+
+    std::string of(const std::string &path, const query_answer &who, const reader::file_header &header,
+                   const ring_contents &contents)
+    {
+        std::string out;
+        line(out, "file", printable_name(path));
+        line(out, "process", fmt::format("{}", who.pid));
+        line(out, "program", escaped(who.program));
+        line(out, "base name", escaped(header.base_program.value_or("")));
+        line(out, "build", escaped(header.build_name.value_or("")));
+        line(out, "platform", fmt::format("{}", who.platform));
+        line(out, "format", fmt::format("version {}", header.version));
+        line(out, "node", fmt::format("number {}, id {:#018x}", header.node_number, header.node_id.value_or(0)));
+        line(out, "size",
+             fmt::format("{} bytes, {} of them the ring", header.file_size, header.ring.end - header.ring.begin));
+        line(out, "time base",
+             fmt::format("{} ticks/s, {} ns at tick 0", header.time_info.timeinfo1,
+                         static_cast<std::int64_t>(header.time_info.timeinfo2)));
+        if (header.tz_offset_minutes) line(out, "zone", zone_text(*header.tz_offset_minutes));
+        line(out, "page", page_text(header));
+        line(out, "records",
+             fmt::format("{}, {} lost before the oldest, {} unfinished", contents.records, contents.lost,
+                         contents.unfinished));
+        if (contents.oldest) line(out, "oldest", record(*contents.oldest));
+        if (contents.newest) line(out, "newest", record(*contents.newest));
+        return out;
+    }
+
+private:
+    static void line(std::string &out, std::string_view name, std::string_view value)
+    {
+        out += fmt::format("{:<10} {}\n", name, value);
+    }
+
+    std::string record(const record_seen &seen)
+    {
+        const auto time = seen.time ? times_.text(*seen.time) : std::nullopt;
+        return fmt::format("{}, sequence {}", time.value_or("time unknown"), seen.sequence);
+    }
+
+    timestamps times_;
+};
+
+json record_json(const record_seen &seen, timestamps &times)
+{
+    json record = {{"sequence", seen.sequence}};
+    if (!seen.time) return record;
+    record["time_ns"] = nanoseconds_text(*seen.time);
+    if (const auto text = times.text(*seen.time)) record["time"] = *text;
+    return record;
+}
+
+// Bytes that are no UTF-8 are replaced: the names here are for people, `dump --json` keeps every byte.
+std::string info_json(const std::string &path, const query_answer &who, const reader::file_header &header,
+                      const ring_contents &contents, bool utc)
+{
+    timestamps times(utc);
+    json info = {{"type", "info"},
+                 {"file", path},
+                 {"pid", who.pid},
+                 {"program", who.program},
+                 {"base_program", header.base_program.value_or("")},
+                 {"build", header.build_name.value_or("")},
+                 {"platform", who.platform},
+                 {"version", header.version},
+                 {"node_number", header.node_number},
+                 {"node_id", fmt::format("{:016x}", header.node_id.value_or(0))},
+                 {"file_bytes", header.file_size},
+                 {"ring_bytes", header.ring.end - header.ring.begin},
+                 {"ticks_per_second", fmt::format("{}", header.time_info.timeinfo1)},
+                 {"ns_at_tick_0", fmt::format("{}", static_cast<std::int64_t>(header.time_info.timeinfo2))},
+                 {"page_state", header.page_state.value_or(0)},
+                 {"records", contents.records},
+                 {"lost", contents.lost},
+                 {"unfinished", contents.unfinished}};
+    if (header.tz_offset_minutes) info["zone_minutes_west"] = *header.tz_offset_minutes;
+    if (contents.oldest) info["oldest"] = record_json(*contents.oldest, times);
+    if (contents.newest) info["newest"] = record_json(*contents.newest, times);
+    return info.dump(-1, ' ', false, json::error_handler_t::replace) + "\n";
+}
+
+int show_file(const std::string &path, const info_options &options, bool first)
+{
+    int status = status_sound;
+    const auto who = ask_library(path, status);
+    if (!who) return status;
+    finding_printer findings(path);
+    try {
+        reader::file_source source(path);
+        reader::trace_reader trace(source, std::ref(findings));
+        if (trace.header()) {
+            const ring_contents contents = look_through(trace);
+            if (options.json) {
+                write_data(info_json(path, *who, *trace.header(), contents, options.utc));
+            } else {
+                if (!first) write_data("\n");
+                write_data(info_text(options.utc).of(path, *who, *trace.header(), contents));
+            }
+        }
+    } catch (const reader::io_error &error) {
+        write_message(fmt::format("{}: {}", printable_name(path), error.what()));
+        status = status_io_error;
+    }
+    findings.finish();
+    return std::max(status, findings.status());
+}
+
+} // namespace
+
+void add_info_command(CLI::App &app, int &status)
+{
+    const auto options = std::make_shared<info_options>();
+    auto *command = app.add_subcommand("info", "Tell who wrote trace files, and what they hold");
+    command->add_flag("--json", options->json, "Print one JSON object a file");
+    command->add_flag("--utc", options->utc, "Print times in UTC instead of the local time zone");
+    command->add_option("FILE", options->files, "Trace files: live ones, pages, or copies")->required();
+    command->callback([options, &status] {
+        int worst = status_sound;
+        for (std::size_t i = 0; i < options->files.size(); ++i)
+            worst = std::max(worst, show_file(options->files[i], *options, i == 0));
+        flush_data();
+        status = worst;
+    });
+}
+
+} // namespace qn::dump

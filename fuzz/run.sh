@@ -21,7 +21,7 @@ for target in "${targets[@]}"; do
     mkdir -p "$build/found/$target"
     log=$build/$target.log
     if env -u QN_TR_FILENAME -u QN_TR_TRACE_LEVELS -u QN_TR_FILE_MAP -u QN_TR_FILE_SIZE \
-        "$build/fuzz_$target" -max_total_time="$seconds" -timeout=10 -rss_limit_mb=2048 -max_len=512 \
+        "$build/fuzz_$target" -max_total_time="$seconds" -timeout=60 -rss_limit_mb=2048 -max_len=512 \
         -print_final_stats=1 -dict=fuzz/specifications.dict -artifact_prefix="$build/failed/$target-" \
         "$build/found/$target" "fuzz/corpus/$target" >"$log" 2>&1; then
         runs=$(sed -n 's/^stat::number_of_executed_units: *//p' "$log")

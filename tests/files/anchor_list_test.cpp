@@ -164,6 +164,29 @@ TEST_F(AnchorList, GrowsByOneForANameThatManyThreadsAskFor)
     EXPECT_EQ(listed, 1 + names);
 }
 
+// Every thread has found that the name is new before the first of them inserts it.
+TEST_F(AnchorList, GrowsByOneForThreadsThatMissedANameTogether)
+{
+    constexpr int threads = 8;
+    std::atomic<int> missed{0};
+    calls().calloc = [&](size_t count, size_t size) {
+        ++missed;
+        while (missed.load() < threads) std::this_thread::yield();
+        return __real_calloc(count, size);
+    };
+    std::vector<trace_anchor_t *> found(threads);
+    std::vector<std::thread> running;
+    for (int t = 0; t < threads; ++t)
+        running.emplace_back([&, t] { found[t] = findOrCreateAnchorForFile("/tmp/a", 1); });
+    for (std::thread &thread : running) thread.join();
+
+    EXPECT_EQ(found, std::vector<trace_anchor_t *>(threads, found[0]));
+    EXPECT_NE(found[0], nullptr);
+    EXPECT_EQ(anchors.numAnchors, 2U);
+    EXPECT_EQ(anchors.next, found[0]);
+    EXPECT_EQ(found[0]->next, nullptr);
+}
+
 class InitAnchor : public testing::Test
 {
 protected:

@@ -236,6 +236,9 @@ TEST_F(DefaultPageSet, IsTakenApartForAnotherName)
     const std::string now = current_name();
     EXPECT_TRUE(now == folder / "g" || now == folder / "g.1.sp") << now;
     EXPECT_EQ(ids_in(now), std::vector<uint32_t>{2});
+    qn::tr::for_each_page(&anchors, [this](const trace_anchor_t *page) {
+        EXPECT_EQ(std::string(page->fileName).rfind(folder / "g", 0), 0U) << page->fileName;
+    });
 }
 
 TEST_F(DefaultPageSet, StopsWholeForANullPointer)

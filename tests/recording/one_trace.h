@@ -2,6 +2,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 
 #include <qn_tr.h>
 
@@ -55,6 +56,8 @@ public:
     uint32_t u32(size_t at) const;
     uint16_t u16(size_t at) const;
     void set_u32(size_t at, uint32_t value);
+    // The whole file, as it changes.
+    std::string_view bytes() const { return {map_, size_}; }
 
 private:
     char *map_ = nullptr;

@@ -9,6 +9,8 @@
 
 #include <gtest/gtest.h>
 
+#include <cu_tr_proxy.h>
+
 #include "recording/writers.h"
 #include "support/scratch.h"
 
@@ -188,6 +190,14 @@ class InterposedWriter : public testing::TestWithParam<writer_call>
 
 std::string name_of(const testing::TestParamInfo<writer_call> &info) { return info.param.name; }
 } // namespace
+
+TEST(InterposedFormatWriter, IsWhatTheCommonUtilitiesWriteThrough)
+{
+    const scratch folder;
+    ASSERT_EQ(tr_set_filename_1((folder / "app.trc").c_str()), 0); // initialises the library
+    EXPECT_EQ(cu_trp_printf_1("COMP", 7, "%d", 5), 0);
+    EXPECT_EQ(passed, format_forms);
+}
 
 INSTANTIATE_TEST_SUITE_P(BelowEvery, InterposedWriter, testing::ValuesIn(all_writers()), name_of);
 

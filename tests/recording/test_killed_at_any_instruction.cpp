@@ -82,17 +82,15 @@ protected:
         ASSERT_EQ(waitpid(child, &status, 0), child);
         if (WIFEXITED(status) && WEXITSTATUS(status) == 77) GTEST_SKIP() << "no process may be traced here";
         ASSERT_TRUE(WIFSTOPPED(status) && WSTOPSIG(status) == SIGSTOP) << status;
-        images_.push_back(file_bytes_now());
+        const tail_reader file(file_);
+        images_.emplace_back(file.bytes());
         while (ptrace(PTRACE_SINGLESTEP, child, nullptr, nullptr) == 0 && waitpid(child, &status, 0) == child &&
                WIFSTOPPED(status)) {
-            const std::string now = file_bytes_now();
-            if (now != images_.back()) images_.push_back(now);
+            if (file.bytes() != images_.back()) images_.emplace_back(file.bytes());
         }
         ASSERT_EQ(status, 0);
         ASSERT_GT(images_.size(), 5U) << "the call was not seen";
     }
-
-    std::string file_bytes_now() const { return qn::test::file_bytes(file_); }
 
     // A record that is to be found: its place, and everything in it.
     using found_records = std::set<std::pair<uint64_t, std::string>>;

@@ -138,6 +138,18 @@ TEST(HeldRecord, HoldsAWriterUpToo)
     EXPECT_EQ(sleeps().size(), 2U);
 }
 
+TEST(HeldRecord, HoldsAWriterUpWhereverItStandsInTheSpan)
+{
+    const one_trace trace(small_file);
+    lay_out({{32, 1, 30}, {36, 1, 32}, {3828, 1, 34}}, 0);
+    tail_reader reader(trace.file());
+    reader.set_u32(tail_reader::seq_lock, 32);
+    on_sleep([&](int) { reader.set_u32(tail_reader::seq_lock, 1); });
+    EXPECT_EQ(tr_record_id_1("TEST", 5), 0);
+    EXPECT_EQ(sleeps().size(), 1U);
+    EXPECT_EQ(trace.image().ring().back().u32(28), 5U);
+}
+
 TEST(Coordination, RaisesTheFlagWhileItWaits)
 {
     const one_trace trace(small_file);

@@ -40,11 +40,9 @@ qn_int32_t restart(trace_anchor_t *anchor)
     return status != 0 ? status : start_trace(anchor);
 }
 
-// The anchor that a size call is about, with the library initialised; null with the status to return.
+// The anchor that a size call is about; null with the status to return.
 trace_anchor_t *anchor_for_size(const char *file_name, int create, qn_int32_t &status)
 {
-    status = init_default_anchor();
-    if (status != 0) return nullptr;
     trace_anchor_t *anchor = findOrCreateAnchorForFile(file_name, create);
     if (anchor == nullptr) status = create != 0 ? set_error(QN_TR_ENOMEM, 14) : set_error(QN_TR_EFILENAME, 17);
     return anchor;
@@ -87,8 +85,9 @@ qn_int32_t tr_set_file_size_1(const char *fileName, const qn_uint32_t size)
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
     if (master_override_off()) return 0;
     const global_lock global; // the lock's result is not looked at
+    qn_int32_t status = init_default_anchor();
+    if (status != 0) return status;
     debug("tr_set_file_size: %s\n", fileName);
-    qn_int32_t status = 0;
     trace_anchor_t *anchor = anchor_for_size(fileName, 1, status);
     return anchor != nullptr ? tr_set_size_in_anchor(anchor, size) : status;
 }
@@ -113,7 +112,8 @@ qn_int32_t tr_get_file_size_1(const char *fileName, qn_uint32_t *pSize)
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
     if (master_override_off()) return 0;
     const global_lock global; // the lock's result is not looked at
-    qn_int32_t status = 0;
+    qn_int32_t status = init_default_anchor();
+    if (status != 0) return status;
     trace_anchor_t *anchor = anchor_for_size(fileName, 0, status);
     return anchor != nullptr ? tr_get_size_from_anchor(anchor, pSize) : status;
 }

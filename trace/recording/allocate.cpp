@@ -99,6 +99,7 @@ struct start_of_process {
     keep_store_order();
     filler->function = free_space;
 }
+
 // The record leaves no room for a rest's header before the end of the file: the rest is declared at the start of the
 // ring. Cannot come about with a sound mapping.
 [[gnu::cold, gnu::noinline]] trace_record_header_t *claim_before_start(trace_anchor_t *anchor, qn_uint32_t consumed,
@@ -117,14 +118,6 @@ struct start_of_process {
     record->length = requested;
     store_relaxed(header_of(anchor)->uOldestRecordOffset, header_of(anchor)->uOffset);
     return record;
-}
-
-// The record ends where the file ends. A page that is full stays so, its oldest record the first; a single file goes on
-// at the start of the ring.
-void start_over(trace_anchor_t *anchor)
-{
-    if (!is_multipage(anchor)) anchor->pNextFree = anchor->pWrap;
-    store_relaxed(header_of(anchor)->uOldestRecordOffset, header_of(anchor)->uOffset);
 }
 } // namespace
 
@@ -192,7 +185,8 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
     } else {
         record = claim_before_start(pAnchor, static_cast<qn_uint32_t>(consumed), requested);
     }
-    if (address(pAnchor->pNextFree) == end) start_over(pAnchor);
+    // The record ends where the file ends: a single file goes on at the start of the ring, a page is full.
+    if (address(pAnchor->pNextFree) == end && !is_multipage(pAnchor)) pAnchor->pNextFree = pAnchor->pWrap;
     stamp(record);
     if (__builtin_expect(start != nullptr, 0)) keep_in_header(header, overwritten);
     return record;

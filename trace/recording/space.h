@@ -38,6 +38,13 @@ inline trace_record_header_t *record_of(const unsigned char *address)
     return 0;
 }
 
+// Where the ring is read from when the free pointer is at `next_free`; at the end of the file, from the ring's start.
+[[gnu::always_inline]] inline qn_uint32_t oldest_offset(trace_anchor_t *anchor, const unsigned char *next_free)
+{
+    if (__builtin_expect(next_free == anchor->pMapEnd, 0)) return header_of(anchor)->uOffset;
+    return static_cast<qn_uint32_t>(next_free - anchor->pMap);
+}
+
 // Makes one record of the `consumed` bytes at the free pointer, and a free rest behind it if they are more than 28 bytes
 // more than were requested. At every instant the records tile the ring: the record first covers all that was consumed,
 // and is cut to its length when the rest has its header.
@@ -63,7 +70,7 @@ inline trace_record_header_t *record_of(const unsigned char *address)
     }
     keep_store_order();
     anchor->pNextFree = record_of(next_free);
-    store_relaxed(header_of(anchor)->uOldestRecordOffset, static_cast<qn_uint32_t>(next_free - anchor->pMap));
+    store_relaxed(header_of(anchor)->uOldestRecordOffset, oldest_offset(anchor, next_free));
     return record;
 }
 

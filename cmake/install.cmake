@@ -12,6 +12,8 @@ foreach(locale C en)
     install(FILES ${QN_TR_CATALOGUE} DESTINATION ${CMAKE_INSTALL_DATADIR}/locale/${locale}/LC_MESSAGES)
 endforeach()
 
+# The prefix is named from where the file lies, so that an installed tree may be moved.
+file(RELATIVE_PATH QN_TR_PC_TO_PREFIX "/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/")
 configure_file(cmake/qn_tr.pc.in qn_tr.pc @ONLY)
 install(FILES ${CMAKE_CURRENT_BINARY_DIR}/qn_tr.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
 

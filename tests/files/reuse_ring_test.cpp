@@ -302,7 +302,7 @@ TEST_F(Ring, WithMoreRecordsThanFitIsCorruption)
         const uint32_t length = 4;
         std::memcpy(&image[offset], &length, sizeof length);
     }
-    record(size - 28, 28, 4);
+    record(size - 28, 28, 4, 0);
     expect_some_damage();
 }
 

@@ -11,7 +11,7 @@ namespace qn::test
 {
 scratch::scratch()
 {
-    std::string name = (std::filesystem::temp_directory_path() / "qn_tr_test.XXXXXX").string();
+    std::string name = (std::filesystem::temp_directory_path() / "qn_tr_test_XXXXXX").string();
     if (mkdtemp(name.data()) == nullptr) std::abort();
     folder_ = name;
 }

@@ -2,6 +2,7 @@
 #include <cerrno>
 #include <csignal>
 #include <grp.h>
+#include <sched.h>
 #include <spawn.h>
 #include <string>
 #include <sys/mount.h>
@@ -26,6 +27,9 @@ public:
     {
         const char *arguments[] = {"my-sleep", "600", nullptr};
         EXPECT_EQ(posix_spawn(&pid_, "/bin/sleep", nullptr, nullptr, const_cast<char **>(arguments), environ), 0);
+        // The call may return a moment before the kernel shows the new program's arguments.
+        while (qn::test::file_bytes("/proc/" + std::to_string(pid_) + "/cmdline").rfind("my-sleep", 0) != 0)
+            sched_yield();
     }
     sleeper(const sleeper &) = delete;
     sleeper &operator=(const sleeper &) = delete;

@@ -21,8 +21,7 @@
 
 QN_BEGIN_DECLS
 
-/* ---- error records
- * ------------------------------------------------------------------------------------------- */
+/* ---- error records ---- */
 
 /* What an insert of a message is. The values are stored in trace files and never change. */
 typedef enum cu_error_arg_type {
@@ -123,8 +122,7 @@ QN_EXPORT void cu_rel_error_1(cu_error_t *error);
  */
 QN_EXPORT int cu_get_errmsg_1(const cu_error_t *error, char **text);
 
-/* ---- time
- * ---------------------------------------------------------------------------------------------------- */
+/* ---- time ---- */
 
 /*
  * The line that leads from counter values to wall-clock time. It is stored in trace files: 16 bytes, native
@@ -183,8 +181,7 @@ QN_EXPORT int cu_ctr_to_time_1(const cu_timeinfo_t *timeinfo, qn_uint64_t ctr, s
  */
 QN_EXPORT int cu_get_current_time_1(struct timespec *time);
 
-/* ---- cluster
- * ------------------------------------------------------------------------------------------------- */
+/* ---- cluster ---- */
 
 /*
  * Which cluster this host belongs to. A value longer than its field is cut; both strings always end with a NUL.
@@ -222,8 +219,7 @@ QN_EXPORT int cu_get_cluster_info_1(cu_cluster_info_t *info);
  */
 QN_EXPORT int cu_get_node_id_1(qn_uint64_t *node_id);
 
-/* ---- processes, groups, signals
- * ------------------------------------------------------------------------------- */
+/* ---- processes, groups, signals ---- */
 
 /*
  * Stores in buffer the arguments of process pid as the kernel keeps them: each with its NUL, one behind the

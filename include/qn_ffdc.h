@@ -85,13 +85,17 @@ QN_EXPORT int fc_mk_syslog_msg_1(const fc_err_tbl_t *entry, const void *detail_d
  *
  *   id                receives the identifier; may be null
  *   reserved0         0
- *   component         who reports, such as "trace"; also names the file, characters other than letters, digits,
- * - and _ become _ subsystem         part of the product, such as "OPAL" file, vers, line  where in which
- * version of the source the failure was found reserved1         0 log_event         FC_EVENT_ERROR,
- * FC_EVENT_WARNING or FC_EVENT_INFO error_id          number of the failure within the component detail_data
- * data captured at the failure, or null; the first 4096 bytes are filed, in hexadecimal detail_data_len   their
- * length in bytes; 0 and less mean none detail_data_file  path of a file with more data, or null; it is named
- * in the record, not read syslog_text       text for the system log, as fc_mk_syslog_msg_1 makes it, or null
+ *   component         who reports, such as "trace"; also names the file, where characters other than letters, digits,
+ *                     - and _ become _
+ *   subsystem         part of the product, such as "OPAL"
+ *   file, vers, line  where in which version of the source the failure was found
+ *   reserved1         0
+ *   log_event         FC_EVENT_ERROR, FC_EVENT_WARNING or FC_EVENT_INFO
+ *   error_id          number of the failure within the component
+ *   detail_data       data captured at the failure, or null; the first 4096 bytes are filed, in hexadecimal
+ *   detail_data_len   their length in bytes; 0 and less mean none
+ *   detail_data_file  path of a file with more data, or null; it is named in the record, not read
+ *   syslog_text       text for the system log, as fc_mk_syslog_msg_1 makes it, or null
  *
  * Any pointer may be null; what it stands for is then missing from the record. The record is text, one "key:
  * value" per line with an empty line behind it, and reaches the file by one write: records of several processes

@@ -2,7 +2,6 @@
 #include <cstring>
 
 #include "trace/files/debug.h"
-#include "trace/files/error_report.h"
 #include "trace/files/trace_file.h"
 #include "trace/recording/recording.h"
 #include "trace/spooling/spool.h"

@@ -5,10 +5,10 @@
 #include <cstdlib>
 #include <cstring>
 #include <new>
-#include <regex.h>
 #include <string_view>
 
 #include "trace/components/component.h"
+#include "trace/files/compiled_pattern.h"
 #include "trace/files/error_report.h"
 
 extern const char matchAll[]; // what a lone "*" stands for
@@ -44,28 +44,6 @@ int scan_component_pattern(specification_text &from, size_t end, pattern_text &c
 
 // 0 when both patterns are regular expressions, else a recorded error at the offset of the one that is not.
 int check_patterns(const pattern_pair &pair, const char *component, const char *category);
-
-// A compiled pattern; freed with its scope.
-class compiled_pattern
-{
-public:
-    explicit compiled_pattern(const char *pattern)
-        : result_(regcomp(&regex_, pattern, REG_EXTENDED | REG_ICASE | REG_NEWLINE | REG_NOSUB))
-    {
-    }
-    compiled_pattern(const compiled_pattern &) = delete;
-    compiled_pattern &operator=(const compiled_pattern &) = delete;
-    ~compiled_pattern()
-    {
-        if (result_ == 0) regfree(&regex_);
-    }
-    explicit operator bool() const { return result_ == 0; }
-    bool matches(const char *name) const { return regexec(&regex_, name, 0, nullptr, 0) == 0; }
-
-private:
-    regex_t regex_{};
-    int result_;
-};
 
 // Frees what was appended to a list behind `last_before` (null: the list was empty).
 template <class Node>

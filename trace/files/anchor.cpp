@@ -3,7 +3,6 @@
 // Guarded by the anchor list mutex: insertion into the list and numAnchors. Look-ups take no lock.
 #include "trace/files/anchor.h"
 
-#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <string_view>
@@ -12,6 +11,7 @@
 #include "trace/files/error_report.h"
 #include "trace/files/locks.h"
 #include "trace/files/shared_words.h"
+#include "trace/files/text.h"
 
 // Its mutex, the global one, needs no creation: a record writer may be the first call of a program.
 constinit trace_anchor_t anchors = {.anchorMutex = PTHREAD_RECURSIVE_MUTEX_INITIALIZER_NP,
@@ -69,12 +69,7 @@ namespace qn::tr
 {
 bool spooling_is_on(const trace_anchor_t *anchor) { return anchor->spool != nullptr && anchor->spool->onoff != 0; }
 
-void set_file_name(trace_anchor_t *anchor, const char *file_name)
-{
-    const size_t length = std::min(std::strlen(file_name), sizeof anchor->fileName - 1);
-    std::memmove(anchor->fileName, file_name, length);
-    anchor->fileName[length] = '\0';
-}
+void set_file_name(trace_anchor_t *anchor, const char *file_name) { copy_cut(anchor->fileName, file_name); }
 } // namespace qn::tr
 
 namespace

@@ -19,4 +19,7 @@ inline bool debug_level_above(qn_uint32_t level)
 
 // Writes one line at priority warning when the level is above 7. A cancellation point then.
 void debug(const char *format, ...) QN_PRINTF_LIKE(1, 2);
+
+// The same at priority error.
+void debug_error(const char *format, ...) QN_PRINTF_LIKE(1, 2);
 } // namespace qn::tr

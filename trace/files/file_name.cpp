@@ -35,8 +35,7 @@ qn_int32_t stop_every_trace()
 qn_int32_t change_default_file(const char *file_name)
 {
     if (is_current_name(file_name)) return 0;
-    take_page_set_apart(&anchors);
-    const qn_int32_t status = stop_trace_locked(&anchors);
+    const qn_int32_t status = become_unbound(&anchors);
     if (status != 0) return status;
     set_file_name(&anchors, file_name);
     return is_trace_on(&anchors) ? start_trace_locked(&anchors) : 0;
@@ -79,7 +78,7 @@ qn_int32_t tr_set_multipage_1(const qn_uint32_t state)
     const qn_int32_t status = init_default_anchor();
     const bool forbidden =
         access(multipage_marker, F_OK) == 0 || std::getenv("QN_TR_DISABLE_DEFAULT_MULTIPAGE") != nullptr;
-    anchors.bMultipageEnabled = forbidden ? 0 : static_cast<int>(state);
+    store_relaxed(anchors.bMultipageEnabled, forbidden ? 0 : static_cast<int>(state));
     if (status == 0) debug("tr_set_multipage has been called with value : %d\n", static_cast<int>(state));
     return status;
 }

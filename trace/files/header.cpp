@@ -1,16 +1,13 @@
 // Writing a fresh file header. Anchor set lock, held by the caller.
 #include <cstring>
 
+#include "trace/files/cluster.h"
 #include "trace/files/debug.h"
 #include "trace/files/trace_file.h"
 #include "trace/recording/recording.h"
-#include "trace/spooling/spool.h"
 
 // Tells the host's byte order: its first byte in memory is 1 on a little-endian one.
 qn_uint16_t endian_test = 0x0001;
-
-cu_cluster_info_t clusterInfo;
-qn_int32_t clusterInfoRC = 0;
 
 namespace
 {
@@ -18,14 +15,15 @@ using namespace qn::tr;
 
 constexpr const char *build_identifier = QN_TR_BUILD_IDENTIFIER;
 
-pthread_once_t cluster_info_once = PTHREAD_ONCE_INIT;
+pthread_once_t cluster_once = PTHREAD_ONCE_INIT;
 
-void fetch_cluster_info() { clusterInfoRC = cu_get_cluster_info_1(&clusterInfo); }
+void ask_for_cluster() { (void)known_cluster(); }
 
 qn_uint16_t node_number()
 {
-    pthread_once(&cluster_info_once, fetch_cluster_info);
-    return clusterInfoRC == 0 ? static_cast<qn_uint16_t>(clusterInfo.cu_node_number) : qn_uint16_t{0};
+    pthread_once(&cluster_once, ask_for_cluster);
+    const cluster_facts cluster = cached_cluster();
+    return cluster.result == 0 ? static_cast<qn_uint16_t>(cluster.info.cu_node_number) : qn_uint16_t{0};
 }
 
 qn_uint8_t initial_page_state(const trace_anchor_t *anchor)

@@ -3,7 +3,8 @@
 
 pthread_mutex_t anchor_list_mutex;
 pthread_mutex_t component_list_mutex = PTHREAD_RECURSIVE_MUTEX_INITIALIZER_NP;
-pthread_mutex_t configuration_file_last_modified_mutex;
+pthread_mutex_t configuration_file_last_modified_mutex = PTHREAD_RECURSIVE_MUTEX_INITIALIZER_NP;
+pthread_mutex_t cluster_info_mutex = PTHREAD_RECURSIVE_MUTEX_INITIALIZER_NP;
 
 void init_recursive_mutex(pthread_mutex_t *mutex)
 {
@@ -37,6 +38,7 @@ void reset_locks_in_child()
     initialize_trace_global_data();
     init_recursive_mutex(&anchors.anchorMutex);
     init_recursive_mutex(&component_list_mutex);
+    init_recursive_mutex(&cluster_info_mutex);
     pthread_cond_init(&spq.cond, nullptr);
     for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = anchor->next) {
         if (anchor->pSpoolMutex != nullptr) init_recursive_mutex(anchor->pSpoolMutex);

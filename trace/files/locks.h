@@ -9,6 +9,7 @@
 //     anchor list mutex       insertion into the list of trace files
 //     component list mutex    the links of the component list, for the look-ups that hold no global mutex
 //     configuration_file_last_modified_mutex
+//     cluster info mutex      the cache of the cluster's facts
 //
 // All of them are recursive. A guard releases its lock when it goes out of scope, also when the thread is cancelled:
 // cancellation unwinds the stack like an exception. So nothing between a guard and a cancellation point may be noexcept.
@@ -40,6 +41,7 @@ void cleanup_anchor_set(void *anchor);
 extern pthread_mutex_t anchor_list_mutex;
 extern pthread_mutex_t component_list_mutex;
 extern pthread_mutex_t configuration_file_last_modified_mutex;
+extern pthread_mutex_t cluster_info_mutex;
 
 namespace qn::tr
 {
@@ -56,6 +58,24 @@ public:
     }
     explicit operator bool() const { return result_ == 0; }
     int result() const { return result_; }
+
+private:
+    pthread_mutex_t *mutex_;
+    int result_;
+};
+
+// Holds a plain mutex if it is free, or this thread's already; never waits. Test it.
+class mutex_try_lock
+{
+public:
+    explicit mutex_try_lock(pthread_mutex_t &mutex) : mutex_(&mutex), result_(pthread_mutex_trylock(&mutex)) {}
+    mutex_try_lock(const mutex_try_lock &) = delete;
+    mutex_try_lock &operator=(const mutex_try_lock &) = delete;
+    ~mutex_try_lock()
+    {
+        if (result_ == 0) mutex_cleanup(mutex_);
+    }
+    explicit operator bool() const { return result_ == 0; }
 
 private:
     pthread_mutex_t *mutex_;

@@ -54,9 +54,10 @@ pthread_mutex_t *new_recursive_mutex()
 qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
 {
     trace_spool_spec_t *spool = head->spool;
-    const qn_uint32_t page_size = spool->pg_size != 0 ? spool->pg_size : head->uRequestedFileSize / pages;
+    const qn_uint32_t wanted = load_relaxed(spool->pg_size);
+    const qn_uint32_t page_size = wanted != 0 ? wanted : head->uRequestedFileSize / pages;
     head->uRequestedFileSize = round_page_size(page_size, head->pageSize);
-    spool->pg_size = head->uRequestedFileSize;
+    store_relaxed(spool->pg_size, head->uRequestedFileSize);
 
     char base_name[trace_file_name_bytes];
     std::memcpy(base_name, head->fileName, sizeof base_name);
@@ -91,6 +92,23 @@ qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
     return 0;
 }
 
+// A page that was cut off from its set stays what it is.
+bool may_become_page_set(const trace_anchor_t *anchor)
+{
+    const bool may_have_pages =
+        load_relaxed(anchors.pFirstSpoolSpec) != nullptr || load_relaxed(anchors.bMultipageEnabled) == 1;
+    return may_have_pages && anchor->nextPage == nullptr && anchor->pMap == nullptr &&
+           (anchor->p_head_spool_anchor == nullptr || anchor->p_head_spool_anchor == anchor);
+}
+
+// The list of specifications is the global mutex's. A writer who starts a damaged trace afresh has only the set lock and
+// must not wait for the other: its trace was bound long ago, and if not, it is bound at its next start.
+void bind_to_specification(trace_anchor_t *anchor)
+{
+    const mutex_try_lock global(anchors.anchorMutex);
+    if (global) process_spool_spec(anchor, anchors.pFirstSpoolSpec);
+}
+
 void start_if_on(trace_anchor_t *anchor, qn_int32_t &status)
 {
     const anchor_set_lock set(anchor);
@@ -115,9 +133,8 @@ qn_int32_t start_trace(trace_anchor_t *anchor)
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
     if (load_relaxed(this_is_child) != 0) return 0; // the parent may be writing the file
 
-    const bool may_have_pages = anchors.pFirstSpoolSpec != nullptr || anchors.bMultipageEnabled == 1;
-    if (anchor->nextPage == nullptr && anchor->pMap == nullptr && may_have_pages) {
-        process_spool_spec(anchor, anchors.pFirstSpoolSpec);
+    if (may_become_page_set(anchor)) {
+        bind_to_specification(anchor);
         if (spooling_is_on(anchor) && anchor->spool->pages != 0) {
             const qn_int32_t status = make_page_set(anchor, anchor->spool->pages);
             if (status != 0) return status;
@@ -163,11 +180,12 @@ qn_int32_t start_traces_that_are_on()
     return status;
 }
 
-void take_page_set_apart(trace_anchor_t *anchor)
+qn_int32_t become_unbound(trace_anchor_t *anchor)
 {
     const anchor_set_lock set(anchor);
-    if (anchor->nextPage == nullptr) return;
-    stop_trace(anchor, load_relaxed(this_is_child));
+    if (!set) return set_error_int(QN_TR_ELOCK, 9, set.result());
+    const qn_int32_t status = stop_trace(anchor, load_relaxed(this_is_child));
+    release_all_obsolete_pages(anchor);
     for (trace_anchor_t *page = anchor->nextPage; page != nullptr && page != anchor;) {
         trace_anchor_t *following = page->nextPage;
         if (page->p_head_spool_anchor == anchor) {
@@ -182,7 +200,7 @@ void take_page_set_apart(trace_anchor_t *anchor)
     anchor->pActivePg = nullptr;
     anchor->ppActivePg = nullptr;
     anchor->p_head_spool_anchor = nullptr;
-    anchor->bSpoolProcessed = 0;
-    store_relaxed(anchor->spool, nullptr);
+    forget_binding(anchor);
+    return status;
 }
 } // namespace qn::tr

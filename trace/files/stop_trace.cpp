@@ -38,13 +38,24 @@ void free_components(trace_anchor_t *anchor)
     }
 }
 
+// Under the queue mutex, so that the thread cannot be between its last test and its wait; but a copy to a slow disk, for
+// which it holds that mutex, is not waited for.
+void wake_spool_thread()
+{
+    const mutex_try_lock queue(spq.mutex);
+    pthread_cond_signal(&spq.cond);
+}
+
 // Lets the spool thread come to its end: at most 2 s.
 void wait_for_spool_thread()
 {
     constexpr int most_waits = 100;
     constexpr useconds_t wait_us = 20000;
-    pthread_cond_signal(&spq.cond);
-    for (int waits = 0; waits < most_waits && load_acquire(is_spool_running) != 0; ++waits) usleep(wait_us);
+    wake_spool_thread();
+    for (int waits = 0; waits < most_waits && load_acquire(is_spool_running) != 0; ++waits) {
+        usleep(wait_us);
+        wake_spool_thread();
+    }
 }
 } // namespace
 
@@ -53,12 +64,15 @@ qn_int32_t stop_trace_page(trace_anchor_t *anchor, int child)
     debug("**@ stop_trace_page enter for %s\n", anchor->fileName);
     if (anchor->pMap == nullptr) return 0;
     if (!child) {
-        store_relaxed(header_of(anchor)->uFlags, 0);
+        {
+            const mutex_lock not_being_copied(spq.mutex);
+            store_relaxed(header_of(anchor)->uFlags, 0);
+        }
         debug("**@ stop_trace_page - msync(MS_SYNC) for %s\n", anchor->fileName);
         msync(anchor->pMap, anchor->uActualFileSize, MS_SYNC);
     }
     const mutex_lock queue(spq.mutex);
-    spool_dequeue_and_delete_element(&spq, anchor);
+    while (sp_q_element_t *element = spool_dequeue_element(&spq, anchor)) std::free(element);
     unmap_page(anchor);
     return 0;
 }

@@ -44,8 +44,9 @@ qn_int32_t stop_trace_locked(trace_anchor_t *anchor);
 // when there was none. Global mutex.
 qn_int32_t start_traces_that_are_on();
 
-// Makes a single file's anchor of a page set's head: what pages there were are stopped and given up. Global mutex.
-void take_page_set_apart(trace_anchor_t *anchor);
+// Stops the trace and forgets what governed it; of a page set's head it makes a single file's anchor, and gives up the
+// pages. Global mutex.
+qn_int32_t become_unbound(trace_anchor_t *anchor);
 
 // Smallest file that is started: a header, and a ring that takes every kind of record.
 inline constexpr qn_uint32_t smallest_file_bytes = 4096;

@@ -1,0 +1,38 @@
+// A compiled regular expression, as every pattern of the library is meant: extended, without regard to case, "." and
+// "[^...]" not matching a line feed.
+#pragma once
+
+#include <cstddef>
+#include <regex.h>
+#include <span>
+
+namespace qn::tr
+{
+// Freed with its scope.
+class compiled_pattern
+{
+public:
+    explicit compiled_pattern(const char *pattern, int flags = REG_NOSUB)
+        : result_(regcomp(&regex_, pattern, REG_EXTENDED | REG_ICASE | REG_NEWLINE | flags))
+    {
+    }
+    compiled_pattern(const compiled_pattern &) = delete;
+    compiled_pattern &operator=(const compiled_pattern &) = delete;
+    ~compiled_pattern()
+    {
+        if (result_ == 0) regfree(&regex_);
+    }
+    explicit operator bool() const { return result_ == 0; }
+    bool matches(const char *text) const { return regexec(&regex_, text, 0, nullptr, 0) == 0; }
+
+    // With the places of the whole match and its groups; compiled with flags 0.
+    bool matches(const char *text, std::span<regmatch_t> places) const
+    {
+        return regexec(&regex_, text, places.size(), places.data(), 0) == 0;
+    }
+
+private:
+    regex_t regex_{};
+    int result_;
+};
+} // namespace qn::tr

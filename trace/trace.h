@@ -14,4 +14,5 @@
 #include "trace/recording/recording.h"
 #include "trace/spooling/spool.h"
 #include "trace/trace_etbl.h"
+#include "trace/traceutils/traceutils.h"
 #include "trace/trapi_set.h"

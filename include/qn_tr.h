@@ -86,7 +86,8 @@ enum {
     QN_TR_ENOTTRACE = 36,      /* not a trace file */
     QN_TR_EHANDLE = 37,        /* query handle invalid */
     QN_TR_EINUSE = 38,         /* component identifier already registered */
-    QN_TR_ECONFOPEN = 48       /* the configuration file could not be opened */
+    QN_TR_ECONFOPEN = 48,      /* the configuration file could not be opened */
+    QN_TR_EWRITE = 49          /* write() failed while a page or file was copied; only in the spool thread's record */
 };
 
 /* ---------------------------------------------------------------------------------------------------------------- */
@@ -394,13 +395,15 @@ QN_EXPORT qn_int32_t tr_ms_record_error_1(const qn_char_t *pCompId, qn_uint32_t 
 /* ---------------------------------------------------------------------------------------------------------------- */
 
 /* Gives the directory that the full pages of the trace file trc_file are copied to, making it when needed, or NULL
- * when they are not. The text belongs to the library and may change when the configuration does. */
+ * when they are not. The text belongs to the library and stays as it is for the life of the process; where pages go
+ * may change with the configuration, which the next call tells. */
 QN_EXPORT char *tr_get_spool_dir_1(const char *trc_file);
 
 /*
  * Has the spool thread copy the file file_name into the directory dest, under its base name with the time added; with
- * del 1 the file is removed after the copy. Both strings must not be NULL; dest must stay valid and unchanged until the
- * copy is done. Returns 0 when the file was queued, 1 when a string is NULL. The copy's own result is not reported.
+ * del 1 the file is removed after that, whether the copy succeeded or not. Both strings must not be NULL; dest must stay
+ * valid and unchanged until the copy is done. Returns 0 when the file was queued, or when memory ran out, which the error
+ * record tells (14); 1 when a string is NULL. The copy's own result is not reported.
  */
 QN_EXPORT qn_int32_t tr_copy_file_1(const char *dest, const char *file_name, int del);
 
@@ -416,7 +419,7 @@ QN_EXPORT void tr_configure_1(void);
 /* Where one trace file is spooled. */
 typedef struct tr_mini_spooling_anchor {
     char fileName[1024]; /* the trace file; a page set is followed by " (8 pages)" */
-    char dest[1024];     /* the spool directory, or "spooling not enabled" */
+    char dest[1024];     /* the spool directory; "/dev/null": pages are reused uncopied; or "spooling not enabled" */
 } tr_mini_spooling_anchor_t;
 
 /*

@@ -67,7 +67,9 @@ TEST_F(DebugLines, TellTheStop)
     clear_system_log();
     stop(anchor);
     EXPECT_EQ(debug_lines(), (lines{"*** stop_trace for " + name, "**@ stop_trace_page enter for " + name + "\n",
-                                    "**@ stop_trace_page - msync(MS_SYNC) for " + name + "\n"}));
+                                    "**@ stop_trace_page - msync(MS_SYNC) for " + name + "\n",
+                                    "spool_dequeue_element (" + name + ")\n", "spool_dequeue_element before: EMPTY\n",
+                                    "spool_dequeue_element after: EMPTY\n"}));
 }
 
 TEST_F(DebugLines, TellTheTimeOfTheStart)

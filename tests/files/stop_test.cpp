@@ -118,8 +118,10 @@ TEST_F(StartedTrace, IsNeitherTouchedNorSyncedByAForkedChild)
     EXPECT_EQ(anchor->pMap, nullptr);
     EXPECT_EQ(anchor->uMaxSize, 0U);
     EXPECT_EQ(anchor->uActualFileSize, 0U);
-    EXPECT_EQ(debug_lines(),
-              (std::vector<std::string>{"*** stop_trace for " + file, "**@ stop_trace_page enter for " + file + "\n"}));
+    EXPECT_EQ(debug_lines(), (std::vector<std::string>{
+                                 "*** stop_trace for " + file, "**@ stop_trace_page enter for " + file + "\n",
+                                 "spool_dequeue_element (" + file + ")\n", "spool_dequeue_element before: EMPTY\n",
+                                 "spool_dequeue_element after: EMPTY\n"}));
 }
 
 class TraceState : public testing::Test

@@ -1,5 +1,6 @@
 // The records that the library writes itself: start, restart, time calibration. Anchor set lock, held by the caller.
 #include <algorithm>
+#include <cstdlib>
 #include <cstring>
 #include <unistd.h>
 
@@ -27,6 +28,25 @@ void write_own_record(trace_anchor_t *anchor, format::kind function, unsigned in
     header->function = static_cast<qn_uint16_t>(function);
 }
 
+// A copy of a text that an earlier one may still be read beside: none is freed, and each leads to the one before.
+struct kept_text {
+    kept_text *before;
+    char text[];
+};
+
+char *kept_copy(const char *text)
+{
+    static kept_text *last = nullptr;
+    if (text == nullptr) return nullptr;
+    const size_t bytes = std::strlen(text) + 1;
+    auto *copy = static_cast<kept_text *>(std::malloc(sizeof(kept_text) + bytes));
+    if (copy == nullptr) return nullptr;
+    std::memcpy(copy->text, text, bytes);
+    copy->before = last;
+    last = copy;
+    return copy->text;
+}
+
 // Which process writes from here on, and how its counter relates to time.
 void fill_start(trace_record_start_t *record)
 {
@@ -36,6 +56,13 @@ void fill_start(trace_record_start_t *record)
     record->timeInfo = time_info;
 }
 } // namespace
+
+qn_int32_t tr_core_event_1(const char *trc_file, const char *message)
+{
+    store_release(gCoreMessage, kept_copy(message));
+    store_release(gCoreTrcFile, kept_copy(trc_file));
+    return 0;
+}
 
 qn_int32_t int_record_start(trace_anchor_t *pAnchor)
 {

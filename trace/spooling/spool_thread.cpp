@@ -1,0 +1,170 @@
+// The spool thread: copies what is queued, syncs pages, and looks after the configuration in between.
+//
+// It holds the queue mutex all the time, except while it waits and while it works under the locks that come before that
+// one: the global mutex and set locks, for the configuration and for syncing.
+#include <csignal>
+#include <cstdlib>
+#include <pthread.h>
+#include <sys/mman.h>
+
+#include "trace/files/debug.h"
+#include "trace/files/library.h"
+#include "trace/files/locks.h"
+#include "trace/files/trace_file.h"
+#include "trace/recording/recording.h"
+#include "trace/spooling/spool_list.h"
+#include "trace/spooling/spool_shape.h"
+
+qn_int32_t is_spool_running = 0;
+pthread_once_t sp_thread_once = PTHREAD_ONCE_INIT;
+
+namespace
+{
+using namespace qn::tr;
+
+// Lets go of a mutex for its scope.
+class unlocked
+{
+public:
+    explicit unlocked(pthread_mutex_t &mutex) : mutex_(mutex) { pthread_mutex_unlock(&mutex_); }
+    unlocked(const unlocked &) = delete;
+    unlocked &operator=(const unlocked &) = delete;
+    ~unlocked() { pthread_mutex_lock(&mutex_); }
+
+private:
+    pthread_mutex_t &mutex_;
+};
+
+// All signals blocked in this thread, for its scope; a thread that it creates inherits that.
+class signals_blocked
+{
+public:
+    signals_blocked()
+    {
+        sigset_t all;
+        sigfillset(&all);
+        pthread_sigmask(SIG_SETMASK, &all, &before_);
+    }
+    signals_blocked(const signals_blocked &) = delete;
+    signals_blocked &operator=(const signals_blocked &) = delete;
+    ~signals_blocked() { pthread_sigmask(SIG_SETMASK, &before_, nullptr); }
+
+private:
+    sigset_t before_;
+};
+
+// The default trace's interval, whatever the other traces have.
+qn_uint32_t seconds_to_wait()
+{
+    const anchor_set_lock set(&anchors);
+    return anchors.spool != nullptr ? anchors.spool->sync_interval : default_sync_seconds;
+}
+
+// Waits for something to do. Tests once more, under the mutex that whoever signals holds, that there is nothing yet.
+void wait_for_work(qn_uint32_t seconds)
+{
+    if (spq.cnt != 0 || configuration_is_forced() || master_override_off()) return;
+    timespec deadline{};
+    cu_get_current_time_1(&deadline);
+    deadline.tv_sec += seconds;
+    debug("Spool thread about to sleep (max=%d)\n", static_cast<int>(seconds));
+    pthread_cond_timedwait(&spq.cond, &spq.mutex, &deadline);
+}
+
+// Looks at the oldest page. A page in any state but full and reusable is left where it is.
+void handle_page(trace_anchor_t *page)
+{
+    if (page->pMap == nullptr) return std::free(spool_dequeue_last_element_inside_spq(&spq));
+    qn_uint8_t &state = header_of(page)->sp_flags;
+    debug("cp_thread checking flags: %d\n", load_relaxed(state));
+    if (load_relaxed(state) == format::page_state::full) {
+        store_relaxed(state, format::page_state::being_spooled);
+        spool_dequeue_last_and_spool_inside_spq(&spq);
+    } else if (load_relaxed(state) == format::page_state::ready) {
+        std::free(spool_dequeue_last_element_inside_spq(&spq));
+    }
+}
+
+// Lets whoever holds a page's lock get on: that is mostly a writer who is taking the page over and needs the queue.
+void wait_for_page_lock()
+{
+    constexpr long wait_ns = 1000000;
+    timespec deadline{};
+    cu_get_current_time_1(&deadline);
+    deadline.tv_nsec += wait_ns;
+    deadline.tv_sec += deadline.tv_nsec / 1000000000;
+    deadline.tv_nsec %= 1000000000;
+    pthread_cond_timedwait(&spq.cond, &spq.mutex, &deadline);
+}
+
+void handle_oldest()
+{
+    if (spq.cnt <= 0 || spq.pLast == nullptr || master_override_off()) return;
+    trace_anchor_t *page = spq.pLast->pAnchor;
+    if (page == nullptr) return spool_dequeue_last_and_spool_inside_spq(&spq);
+
+    // A page's lock comes before the queue's: it may be tried here, never waited for. The page is there as long as its
+    // element is.
+    const mutex_try_lock page_lock(page->anchorMutex);
+    if (page_lock)
+        handle_page(page);
+    else
+        wait_for_page_lock();
+}
+
+void work_until_stopped()
+{
+    const mutex_lock queue(spq.mutex);
+    while (!master_override_off()) {
+        debug("cp_thread locked mutex; cnt: %d\n", spq.cnt);
+        if (spq.cnt == 0) {
+            qn_uint32_t seconds = 0;
+            {
+                const unlocked others_first(spq.mutex);
+                configure_if_necessary();
+                seconds = seconds_to_wait();
+            }
+            wait_for_work(seconds);
+        }
+        {
+            const unlocked others_first(spq.mutex);
+            configure_if_necessary();
+            if (!master_override_off() && use_msync_enabled_except_flush != 0) msync_trace_pages(1, MS_ASYNC, 1);
+        }
+        handle_oldest();
+    }
+}
+} // namespace
+
+void mk_sp_thread(void)
+{
+    pthread_t thread = 0;
+    const signals_blocked until_it_blocks_them_itself;
+    if (pthread_create(&thread, nullptr, cp_thread, nullptr) != 0) {
+        debug("ERROR: cannot create spooling thread.\n");
+        return;
+    }
+    debug("Spooling thread created: (%llu)\n", static_cast<unsigned long long>(thread));
+    pthread_detach(thread);
+}
+
+void *cp_thread(void *)
+{
+    store_release(is_spool_running, 1);
+    debug("Start cp_thread...\n");
+    cu_block_thread_allsig_except_syncsig_1();
+    work_until_stopped();
+    store_release(is_spool_running, 0);
+    return nullptr;
+}
+
+qn_int32_t tr_copy_file_1(const char *dest, const char *file_name, int del)
+{
+    pthread_once(&trace_global_data_once, initialize_trace_global_data);
+    debug_error("tr_copy_file '%s' -> '%s'\n", file_name != nullptr ? file_name : "(NULL)",
+                dest != nullptr ? dest : "(NULL)");
+    if (dest == nullptr || file_name == nullptr) return 1;
+    pthread_once(&sp_thread_once, mk_sp_thread);
+    spool_enqueue(file_name, dest, nullptr, &spq, del);
+    return 0;
+}

@@ -123,9 +123,7 @@ struct start_of_process {
 
 trace_record_header_t *allocate_space(trace_anchor_t *pAnchor, unsigned int *pReqLength)
 {
-    if (spooling_is_on(pAnchor) && pAnchor->ppActivePg != nullptr && *pAnchor->ppActivePg != nullptr)
-        return allocate_space_page(*pAnchor->ppActivePg, pReqLength);
-    return allocate_space_page(pAnchor, pReqLength);
+    return allocate_space_page(page_to_write(pAnchor), pReqLength);
 }
 
 trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int *pReqLength)

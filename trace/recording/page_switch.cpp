@@ -135,8 +135,10 @@ trace_record_header_t *pageFull(trace_anchor_t *pAnchor, unsigned int *pReqLengt
         set_error(QN_TR_ENOMEM, 14);
         return nullptr;
     }
-    if (!ring_can_be_written(next, pAnchor)) return nullptr;
-
+    if (!ring_can_be_written(next, pAnchor)) {
+        spool_dequeue_and_delete_element(&spq, pAnchor); // the next record comes here again
+        return nullptr;
+    }
     for (;; next = next->nextPage) {
         if (!can_be_written(next, pAnchor)) continue;
         const mutex_try_lock page_lock(next->anchorMutex);

@@ -9,6 +9,7 @@
 
 #include "trace/files/trace_file.h"
 #include "trace/recording/recording.h"
+#include "trace/spooling/spool_types.h"
 
 namespace qn::tr
 {
@@ -84,15 +85,22 @@ inline void stamp(trace_record_header_t *record)
     record->timeStamp = now;
 }
 
-// What the writers call. A reader's request to wait, a record that is too long and a page set take the long way.
+// The page of a page set that is being written; a single file's anchor is its own.
+[[gnu::always_inline]] inline trace_anchor_t *page_to_write(trace_anchor_t *anchor)
+{
+    if (__builtin_expect(anchor->ppActivePg == nullptr, 1)) return anchor;
+    trace_anchor_t *active = *anchor->ppActivePg;
+    return active != nullptr && anchor->spool != nullptr && anchor->spool->onoff != 0 ? active : anchor;
+}
+
+// What the writers call. A reader's request to wait, a record that is too long and the end of a page take the long way.
 [[gnu::always_inline]] inline trace_record_header_t *reserve(trace_anchor_t *anchor, unsigned int requested)
 {
-    if (__builtin_expect(anchor->spool == nullptr && requested <= anchor->uMaxSize &&
-                             load_relaxed(header_of(anchor)->uTailReq) == 0,
-                         1)) {
-        const qn_uint32_t consumed = plain_span(anchor, qn_uint64_t{requested} + format::record_header_bytes);
+    trace_anchor_t *page = page_to_write(anchor);
+    if (__builtin_expect(requested <= page->uMaxSize && load_relaxed(header_of(page)->uTailReq) == 0, 1)) {
+        const qn_uint32_t consumed = plain_span(page, qn_uint64_t{requested} + format::record_header_bytes);
         if (__builtin_expect(consumed != 0, 1)) {
-            trace_record_header_t *record = claim(anchor, consumed, requested);
+            trace_record_header_t *record = claim(page, consumed, requested);
             stamp(record);
             return record;
         }

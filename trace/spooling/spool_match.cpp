@@ -91,6 +91,7 @@ trace_spool_spec_t *match_spool_file_name(const char *trc_file, trace_spool_spec
 
 char *tr_get_spool_dir_1(const char *trc_file)
 {
+    if (trc_file == nullptr) return nullptr;
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
     const global_lock global; // the lock's result is not looked at
     pthread_once(&sp_read_cfg, read_spool_cfg);

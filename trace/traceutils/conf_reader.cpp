@@ -11,6 +11,7 @@
 #include <strings.h>
 
 #include "trace/files/error_report.h"
+#include "trace/files/text.h"
 #include "trace/traceutils/conf_line.h"
 #include "trace/traceutils/raw_config.h"
 #include "trace/traceutils/traceutils.h"
@@ -68,7 +69,7 @@ const section_keys &keys_of(section_type type)
 class conf_parser
 {
 public:
-    conf_parser(trace_raw_config_t *config, std::vector<conf_fault> *faults) : config_(config), faults_(faults) {}
+    conf_parser(trace_raw_config_t *config, conf_findings *findings) : config_(config), findings_(findings) {}
     qn_int32_t take(const conf_line &line, unsigned number); // 0 or 14
     qn_int32_t finish();                                     // 0 or 14
 
@@ -84,15 +85,15 @@ private:
     std::string missing_keys() const;
 
     trace_raw_config_t *config_;
-    std::vector<conf_fault> *faults_;
+    conf_findings *findings_;            // may be null
     const section_keys *keys_ = nullptr; // null where a header is expected
     unsigned seen_ = 0;                  // which of the keys
     bool failed_ = false;                // the current section has
     section_ptr open_;                   // the current section until it becomes a chunk
     trace_raw_section_t *current_ = nullptr;
-    raw_text_room text_; // of the current section
-    unsigned number_ = 0;
-    unsigned header_number_ = 0;
+    raw_text_room text_;        // of the current section
+    unsigned number_ = 0;       // of the line
+    unsigned first_number_ = 0; // of the current section's first line
 };
 
 qn_int32_t conf_parser::take(const conf_line &line, unsigned number)
@@ -140,9 +141,7 @@ qn_int32_t conf_parser::take_header(const conf_line &line)
     }
     failed_ = false;
     seen_ = 0;
-    header_number_ = number_;
-    std::snprintf(current_->sect_name, sizeof current_->sect_name, "%.*s", static_cast<int>(line.name.size()),
-                  line.name.data());
+    copy_cut(current_->sect_name, line.name);
     keys_ = &keys_of(type_of_section(current_->sect_name));
     return 0;
 }
@@ -155,11 +154,11 @@ qn_int32_t conf_parser::take_pair(const conf_line &line)
         return 0;
     }
     seen_ |= bit;
-    // Both parts are followed by what is no part of them, and are short: the copies cannot run out of room.
+    // No line is longer than these.
     char key[sizeof key_value_t::key];
     char value[sizeof key_value_t::key];
-    std::snprintf(key, sizeof key, "%.*s", static_cast<int>(line.key.size()), line.key.data());
-    std::snprintf(value, sizeof value, "%.*s", static_cast<int>(line.value.size()), line.value.data());
+    copy_cut(key, line.key);
+    copy_cut(value, line.value);
     return addKeyValue(current_, key, value);
 }
 
@@ -169,6 +168,7 @@ qn_int32_t conf_parser::new_section()
     if (open_ == nullptr) return set_error(QN_TR_ENOMEM, 14);
     current_ = open_.get();
     text_ = {};
+    first_number_ = number_;
     return 0;
 }
 
@@ -176,15 +176,17 @@ qn_int32_t conf_parser::new_section()
 qn_int32_t conf_parser::close_section()
 {
     const qn_int32_t status = addRawElement(config_, section_chunk, open_.get());
-    if (status == 0) open_.release();
+    if (status != 0) return status;
+    open_.release();
     keys_ = nullptr;
-    return status;
+    if (findings_ != nullptr) findings_->section_lines.push_back(first_number_);
+    return 0;
 }
 
 // Whatever follows is faulty as well, and only the first fault is told.
 void conf_parser::mark_error(const conf_line &line)
 {
-    if (faults_ != nullptr && !failed_) faults_->push_back({number_, current_->sect_name, reason(line)});
+    if (findings_ != nullptr && !failed_) findings_->faults.push_back({number_, current_->sect_name, reason(line)});
     current_->bErr_flag = 1;
     failed_ = true;
     keys_ = nullptr;
@@ -214,13 +216,14 @@ qn_int32_t conf_parser::finish()
 {
     if (keys_ == nullptr) return 0;
     if (keys_->has_required(seen_)) return close_section();
-    if (faults_ != nullptr)
-        faults_->push_back({header_number_, current_->sect_name, missing_keys() + " missing at the end of the file"});
+    if (findings_ != nullptr)
+        findings_->faults.push_back(
+            {first_number_, current_->sect_name, missing_keys() + " missing at the end of the file"});
     return 0;
 }
 } // namespace
 
-qn_int32_t read_conf_file(const char *file_name, trace_raw_config_t **config, std::vector<conf_fault> *faults)
+qn_int32_t read_conf_file(const char *file_name, trace_raw_config_t **config, conf_findings *findings)
 {
     // "c": reading is no cancellation point, so that a cancelled thread leaves no stream behind.
     const file_ptr file(std::fopen(file_name, "rce"));
@@ -231,7 +234,7 @@ qn_int32_t read_conf_file(const char *file_name, trace_raw_config_t **config, st
     config_ptr result(static_cast<trace_raw_config_t *>(std::calloc(1, sizeof(trace_raw_config_t))));
     if (result == nullptr) return set_error(QN_TR_ENOMEM, 14);
 
-    conf_parser parser(result.get(), faults);
+    conf_parser parser(result.get(), findings);
     conf_lines lines(file.get());
     while (lines.next()) {
         if (*lines.text() == '\0') continue;

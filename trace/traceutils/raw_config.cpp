@@ -8,6 +8,7 @@
 #include <string_view>
 
 #include "trace/files/error_report.h"
+#include "trace/files/text.h"
 #include "trace/traceutils/traceutils.h"
 
 using namespace qn::tr;
@@ -82,7 +83,7 @@ qn_int32_t addKeyValue(trace_raw_section_t *section, const char *key, const char
         return set_error(QN_TR_ENOMEM, 14);
     }
     key_value_t &pair = section->kv_list[section->num_element++];
-    std::snprintf(pair.key, sizeof pair.key, "%s", key);
+    copy_cut(pair.key, key);
     pair.pValue = copy;
     return 0;
 }

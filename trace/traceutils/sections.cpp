@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "trace/files/text.h"
 #include "trace/traceutils/raw_config.h"
 #include "trace/traceutils/traceutils.h"
 
@@ -16,12 +17,6 @@ constexpr size_t element_step = 100;
 constexpr const char *fill_in_dest = "/dev/null";
 constexpr const char *fill_in_spooling = "OFF";
 
-template <size_t bytes>
-void copy_text(char (&field)[bytes], const char *text)
-{
-    std::snprintf(field, bytes, "%s", text);
-}
-
 // The next element of the list, cleared but for its type and name; null when memory runs out.
 trace_config_element_t *new_element(trace_conf_data_t *data, qn_uint32_t type, const char *sect_name)
 {
@@ -29,7 +24,7 @@ trace_config_element_t *new_element(trace_conf_data_t *data, qn_uint32_t type, c
     auto *element = static_cast<trace_config_element_t *>(std::calloc(1, sizeof(trace_config_element_t)));
     if (element == nullptr) return nullptr;
     element->elementType = type;
-    copy_text(element->sect_name, sect_name);
+    copy_cut(element->sect_name, sect_name);
     data->pTraceConfigElement[data->num_elements++] = element;
     return element;
 }
@@ -77,9 +72,9 @@ qn_int32_t addTraceElement(trace_conf_data_t *data, const char *sect_name, const
     trace_config_element_t *element = new_element(data, TRACE_ELEMENT, sect_name);
     if (element == nullptr) return QN_TR_ENOMEM;
     trace_element_t &trace = element->element.trace_element;
-    copy_text(trace.dest, dst);
-    copy_text(trace.pattern, pat);
-    copy_text(trace.spooling, onoff);
+    copy_cut(trace.dest, dst);
+    copy_cut(trace.pattern, pat);
+    copy_cut(trace.spooling, onoff);
     trace.pages = iPages;
     trace.pg_size = iSize;
     trace.trace_size = iTraceSize;
@@ -93,8 +88,8 @@ qn_int32_t addSpoolElement(trace_conf_data_t *data, const char *sect_name, const
     trace_config_element_t *element = new_element(data, SPOOL_ELEMENT, sect_name);
     if (element == nullptr) return QN_TR_ENOMEM;
     spool_element_t &spool = element->element.spool_element;
-    copy_text(spool.spool_dir, spdir);
-    copy_text(spool.cleanup, spcleanup);
+    copy_cut(spool.spool_dir, spdir);
+    copy_cut(spool.cleanup, spcleanup);
     spool.cleanup_interval = spinterval;
     spool.retention_days = spretentiondays;
     spool.dir_size = spspoolsz;
@@ -108,8 +103,8 @@ qn_int32_t addDefaultElement(trace_conf_data_t *data, const char *sect_name, con
     trace_config_element_t *element = new_element(data, DEFAULT_ELEMENT, sect_name);
     if (element == nullptr) return QN_TR_ENOMEM;
     default_element_t &standard = element->element.default_element;
-    copy_text(standard.dest, dst);
-    copy_text(standard.spooling, onoff);
+    copy_cut(standard.dest, dst);
+    copy_cut(standard.spooling, onoff);
     standard.trace_size = iTraceSize;
     return 0;
 }

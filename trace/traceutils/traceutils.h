@@ -19,9 +19,14 @@ struct conf_fault {
     std::string text;    // why, for a person
 };
 
-// Reads a configuration file by name; tr_read_conf_file_1 with the name of the system's. Where `faults` is not null, it
-// receives the faulty sections in file order, those too that are discarded.
-qn_int32_t read_conf_file(const char *file_name, trace_raw_config_t **config, std::vector<conf_fault> *faults);
+// What a person wants to know of a file beside its configuration.
+struct conf_findings {
+    std::vector<unsigned> section_lines; // where each section begins, in the order of the chunks that are sections
+    std::vector<conf_fault> faults; // in file order, those of sections too that are dropped with the end of the file
+};
+
+// Reads a configuration file by name; tr_read_conf_file_1 with the name of the system's. `findings` may be null.
+qn_int32_t read_conf_file(const char *file_name, trace_raw_config_t **config, conf_findings *findings);
 } // namespace qn::tr
 
 // The first section of that name without an error, or null.

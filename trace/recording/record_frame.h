@@ -52,7 +52,7 @@ __attribute__((no_sanitize("address"))) inline void copy_component_id(char *to, 
 }
 
 template <class Writer>
-inline qn_int32_t write_record(const qn_char_t *comp_id, tr_file_token_t token, Writer &writer)
+[[gnu::always_inline]] inline qn_int32_t write_record(const qn_char_t *comp_id, tr_file_token_t token, Writer &writer)
 {
     if (master_override_off()) return 0;
     trace_anchor_t *anchor = token != nullptr ? token : &anchors;

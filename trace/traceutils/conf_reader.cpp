@@ -113,7 +113,7 @@ qn_int32_t conf_parser::take_comment(const conf_line &line)
     text_ptr copy(strdup(line.text));
     if (copy == nullptr) return set_error(QN_TR_ENOMEM, 14);
     const qn_int32_t status = addRawElement(config_, comment_chunk, copy.get());
-    if (status == 0) copy.release();
+    if (status == 0) (void)copy.release();
     return status;
 }
 
@@ -177,7 +177,7 @@ qn_int32_t conf_parser::close_section()
 {
     const qn_int32_t status = addRawElement(config_, section_chunk, open_.get());
     if (status != 0) return status;
-    open_.release();
+    (void)open_.release();
     keys_ = nullptr;
     if (findings_ != nullptr) findings_->section_lines.push_back(first_number_);
     return 0;
@@ -211,14 +211,14 @@ std::string conf_parser::missing_keys() const
     return list + (list.find(" and ") == std::string::npos ? " is" : " are");
 }
 
-// What was not completed is dropped.
+// What has failed or was not completed is dropped.
 qn_int32_t conf_parser::finish()
 {
-    if (keys_ == nullptr) return 0;
+    if (open_ == nullptr || keys_ == nullptr) return 0;
     if (keys_->has_required(seen_)) return close_section();
     if (findings_ != nullptr)
         findings_->faults.push_back(
-            {first_number_, current_->sect_name, missing_keys() + " missing at the end of the file"});
+            {first_number_, open_->sect_name, missing_keys() + " missing at the end of the file"});
     return 0;
 }
 } // namespace

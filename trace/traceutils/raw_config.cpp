@@ -64,7 +64,7 @@ qn_int32_t addRawElement(trace_raw_config_t *config, qn_int32_t type, void *data
 {
     auto *chunk = static_cast<trace_chunk_t *>(std::malloc(sizeof(trace_chunk_t)));
     if (chunk == nullptr) return set_error(QN_TR_ENOMEM, 14);
-    if (!make_room(config->ppChunkLst, entries(config->num_element), chunk_step)) {
+    if (!make_room<chunk_step>(config->ppChunkLst, entries(config->num_element))) {
         std::free(chunk);
         return set_error(QN_TR_ENOMEM, 14);
     }
@@ -78,7 +78,7 @@ qn_int32_t addKeyValue(trace_raw_section_t *section, const char *key, const char
 {
     char *copy = strdup(value);
     if (copy == nullptr) return set_error(QN_TR_ENOMEM, 14);
-    if (!make_room(section->kv_list, entries(section->num_element), pair_step)) {
+    if (!make_room<pair_step>(section->kv_list, entries(section->num_element))) {
         std::free(copy);
         return set_error(QN_TR_ENOMEM, 14);
     }

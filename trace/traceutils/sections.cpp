@@ -20,7 +20,7 @@ constexpr const char *fill_in_spooling = "OFF";
 // The next element of the list, cleared but for its type and name; null when memory runs out.
 trace_config_element_t *new_element(trace_conf_data_t *data, qn_uint32_t type, const char *sect_name)
 {
-    if (!make_room(data->pTraceConfigElement, data->num_elements, element_step)) return nullptr;
+    if (!make_room<element_step>(data->pTraceConfigElement, data->num_elements)) return nullptr;
     auto *element = static_cast<trace_config_element_t *>(std::calloc(1, sizeof(trace_config_element_t)));
     if (element == nullptr) return nullptr;
     element->elementType = type;

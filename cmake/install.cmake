@@ -1,4 +1,4 @@
-# What `cmake --install` puts where: headers, libraries, pkg-config file, CMake package, command, manual page, catalogue.
+# What `cmake --install` puts where: headers, libraries, pkg-config file, CMake package, command, manual pages, catalogue.
 include(CMakePackageConfigHelpers)
 
 install(FILES include/qn.h include/qn_cu.h include/qn_ffdc.h include/cu_tr_proxy.h include/qn_tr.h
@@ -6,6 +6,8 @@ install(FILES include/qn.h include/qn_cu.h include/qn_ffdc.h include/cu_tr_proxy
 install(TARGETS qn_tr qn_cu qn_ffdc EXPORT qn_tr_targets LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
 install(TARGETS qntrace RUNTIME DESTINATION ${CMAKE_INSTALL_BINDIR})
 install(FILES tools/qntrace/qntrace.1 DESTINATION ${CMAKE_INSTALL_MANDIR}/man1)
+install(FILES docs/trace.conf.5 DESTINATION ${CMAKE_INSTALL_MANDIR}/man5)
+install(FILES docs/trace.conf.sample DESTINATION ${CMAKE_INSTALL_DOCDIR}/examples)
 
 # Where catopen() looks without NLSPATH, for the locales whose language the texts are in.
 foreach(locale C en)

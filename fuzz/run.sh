@@ -12,8 +12,11 @@ seconds=${1:-60}
 build=$PWD/build/fuzz
 
 CC=${CC:-clang} CXX=${CXX:-clang++} cmake -S fuzz -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo >/dev/null
-targets=(levels map sizes selection)
+targets=(levels map sizes selection conf)
 cmake --build "$build" --target "${targets[@]/#/fuzz_}" -- --quiet
+
+# A configuration file has a language of its own, and lines of 1022 characters in it.
+declare -A longest=([conf]=4096) words=([conf]=conf)
 
 mkdir -p "$build/failed"
 status=0
@@ -21,8 +24,9 @@ for target in "${targets[@]}"; do
     mkdir -p "$build/found/$target"
     log=$build/$target.log
     if env -u QN_TR_FILENAME -u QN_TR_TRACE_LEVELS -u QN_TR_FILE_MAP -u QN_TR_FILE_SIZE \
-        "$build/fuzz_$target" -max_total_time="$seconds" -timeout=60 -rss_limit_mb=2048 -max_len=512 \
-        -print_final_stats=1 -dict=fuzz/specifications.dict -artifact_prefix="$build/failed/$target-" \
+        "$build/fuzz_$target" -max_total_time="$seconds" -timeout=60 -rss_limit_mb=2048 \
+        -max_len="${longest[$target]:-512}" -dict="fuzz/${words[$target]:-specifications}.dict" \
+        -print_final_stats=1 -artifact_prefix="$build/failed/$target-" \
         "$build/found/$target" "fuzz/corpus/$target" >"$log" 2>&1; then
         runs=$(sed -n 's/^stat::number_of_executed_units: *//p' "$log")
         printf '%-10s clean: %s inputs in %s s\n' "$target" "$runs" "$seconds"

@@ -26,11 +26,6 @@ struct dump_options {
     std::vector<std::string> files;
 };
 
-bool carries_data(const reader::record_body &body)
-{
-    return !std::holds_alternative<reader::free_body>(body) && !std::holds_alternative<reader::unfinished_body>(body);
-}
-
 // Prints one file; `Format` is text_dump or json_dump.
 template <typename Format>
 void dump_records(const std::string &path, reader::trace_reader &trace, Format &format, bool raw)
@@ -40,7 +35,7 @@ void dump_records(const std::string &path, reader::trace_reader &trace, Format &
     format.header(line, path, *trace.header());
     write_data(line);
     while (const auto record = trace.next()) {
-        if (!raw && !carries_data(record->body)) continue;
+        if (!raw && !reader::carries_data(record->body)) continue;
         line.clear();
         format.record(line, *record);
         write_data(line);

@@ -25,6 +25,8 @@ int run(int argc, char **argv)
                "2 wrong usage, 3 a file cannot be read.");
     qn::dump::add_dump_command(app, status);
     qn::dump::add_info_command(app, status);
+    qn::dump::add_spool_command(app, status);
+    qn::dump::add_config_command(app, status);
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError &error) {

@@ -207,6 +207,11 @@ private:
 
 } // namespace
 
+bool carries_data(const record_body &body)
+{
+    return !std::holds_alternative<free_body>(body) && !std::holds_alternative<unfinished_body>(body);
+}
+
 decoded_record decode(const raw_record &record)
 {
     decoder from(record.bytes);

@@ -124,6 +124,9 @@ using record_body =
     std::variant<free_body, unfinished_body, identifier_body, page_note_body, data_blocks_body, values_32_body,
                  values_64_body, error_body, strings_body, start_body, calibration_body, restart_body, unknown_body>;
 
+// False for what holds no record: free space, and a record that was not completed.
+bool carries_data(const record_body &body);
+
 struct decoded_record {
     record_body body;
     std::string problem; // what does not fit; empty when all is sound

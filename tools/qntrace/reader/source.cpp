@@ -4,17 +4,16 @@
 #include <cerrno>
 #include <cstring>
 
-#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 namespace qn::reader
 {
 
-file_source::file_source(const std::string &path)
+file_source::file_source(const std::string &path, int folder)
 {
     // O_NONBLOCK: opening a FIFO must not wait for its writer; on a regular file it means nothing.
-    descriptor_ = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK);
+    descriptor_ = openat(folder, path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK);
     if (descriptor_ < 0) throw io_error(errno, "cannot be opened");
     struct stat status = {};
     const bool known = fstat(descriptor_, &status) == 0;

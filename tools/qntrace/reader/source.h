@@ -11,6 +11,8 @@
 #include <system_error>
 #include <vector>
 
+#include <fcntl.h>
+
 namespace qn::reader
 {
 
@@ -31,11 +33,12 @@ public:
     virtual std::size_t read_at(std::uint64_t offset, std::span<std::byte> into) = 0;
 };
 
-// A regular file, opened read-only. Anything else (a directory, a FIFO, a device) is refused without waiting for it.
+// A regular file, opened read-only. Anything else (a directory, a FIFO, a device) is refused without waiting for it. A
+// relative path counts from `folder`, so that files are in reach whose whole path is longer than one may be.
 class file_source final : public byte_source
 {
 public:
-    explicit file_source(const std::string &path);
+    explicit file_source(const std::string &path, int folder = AT_FDCWD);
     ~file_source() override;
     file_source(const file_source &) = delete;
     file_source &operator=(const file_source &) = delete;

@@ -27,10 +27,11 @@ void set_requested_size(trace_anchor_t *page, qn_uint32_t size)
     debug("^^^ setting size in %s", page->fileName);
     page->uRequestedFileSize = size;
     if (!spooling_is_on(page)) return;
-    page->spool->pages = std::max(size / spooled_page_bytes, fewest_spooled_pages);
+    const qn_uint32_t pages = std::max(size / spooled_page_bytes, fewest_spooled_pages);
+    store_relaxed(page->spool->pages, pages); // of other traces too, whose writers read it
     // The expression is the interface: other programs reckon with its results.
     const auto memory_page = static_cast<qn_uint32_t>(page->pageSize);
-    page->uRequestedFileSize = (size / page->spool->pages + memory_page) & ~memory_page;
+    page->uRequestedFileSize = (size / pages + memory_page) & ~memory_page;
 }
 
 qn_int32_t restart(trace_anchor_t *anchor)

@@ -135,8 +135,9 @@ qn_int32_t start_trace(trace_anchor_t *anchor)
 
     if (may_become_page_set(anchor)) {
         bind_to_specification(anchor);
-        if (spooling_is_on(anchor) && anchor->spool->pages != 0) {
-            const qn_int32_t status = make_page_set(anchor, anchor->spool->pages);
+        const qn_uint32_t pages = spooling_is_on(anchor) ? load_relaxed(anchor->spool->pages) : 0;
+        if (pages != 0) {
+            const qn_int32_t status = make_page_set(anchor, pages);
             if (status != 0) return status;
         }
     }

@@ -29,7 +29,7 @@ constexpr auto start_kind = static_cast<qn_uint16_t>(format::kind::start);
 // A trace of several pages never wraps inside a page. One that was started as a single file stays one.
 bool is_multipage(const trace_anchor_t *anchor)
 {
-    return anchor->spool != nullptr && anchor->spool->onoff != 0 && anchor->spool->pages > 1 &&
+    return anchor->spool != nullptr && anchor->spool->onoff != 0 && load_relaxed(anchor->spool->pages) > 1 &&
            anchor->ppActivePg != nullptr;
 }
 

@@ -27,6 +27,7 @@ inline trace_record_header_t *record_of(const unsigned char *address)
     const qn_uint32_t held_by_reader = load_relaxed(header_of(anchor)->uSeqLock);
     const unsigned char *last_place = anchor->pMapEnd - format::record_header_bytes;
     const unsigned char *first = address(anchor->pNextFree);
+    if (__builtin_expect(first > last_place, 0)) return 0; // a page that was filled exactly
     const unsigned char *at = first;
     for (int records = 0; records < most_records; ++records) {
         const trace_record_header_t *record = record_of(at);

@@ -87,6 +87,15 @@ trace_anchor_t *take_back(trace_anchor_t *head, const char *page_name)
     return found;
 }
 
+// A resize changes the number of pages that a specification names, and leaves the rings as they are.
+bool is_in_ring(trace_anchor_t *head, const char *page_name)
+{
+    bool found = false;
+    for_each_page(head,
+                  [&](const trace_anchor_t *page) { found = found || std::strcmp(page->fileName, page_name) == 0; });
+    return found;
+}
+
 // Starts a page that joins a set which is being written. Its file may have been the active page of a process that died;
 // the writers stay on the page they are on, which holds this process's time base.
 void start_new_page(trace_anchor_t *head, trace_anchor_t *page)
@@ -172,6 +181,7 @@ trace_anchor_t *add_new_pages(trace_anchor_t *p_anchor, trace_spool_spec_t *p_ol
         char page_name[trace_file_name_bytes];
         std::snprintf(page_name, sizeof page_name, "%.*s.%u.sp", static_cast<int>(sizeof page_name - page_suffix_bytes),
                       base_name, number);
+        if (is_in_ring(p_anchor, page_name)) continue;
         trace_anchor_t *page = take_back(p_anchor, page_name);
         if (page == nullptr) page = getSplAnchor(p_anchor, page_name);
         if (page == nullptr) return give_up();

@@ -1,5 +1,6 @@
 #!/usr/bin/env bash
-# Traces a real program and shows what it left behind: once when it ended well, once when it was killed.
+# Traces a real program and shows what it left behind: once when it ended well, once when it was killed, and once when
+# it wrote far more than its live trace holds.
 #
 #   examples/demo.sh build-folder
 set -euo pipefail
@@ -49,3 +50,5 @@ kill -KILL "$program"
 wait "$program" 2>/dev/null || true
 step "the trace that it left, decoded"
 show "$folder/killed.trc"
+
+"$(dirname "$0")/demo_spool.sh" "$build"

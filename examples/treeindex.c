@@ -14,6 +14,7 @@
 #include <dirent.h>
 #include <errno.h>
 #include <pthread.h>
+#include <stdatomic.h>
 #include <stdbool.h>
 #include <stdio.h>
 #include <stdlib.h>
@@ -56,6 +57,12 @@ enum {
     FILE_SUMMARY,
     FILE_UNREADABLE
 };
+
+/* Records written, so that whoever reads the trace may count them again. */
+static atomic_ulong records;
+
+/* A trace point: one byte is tested, and the call is made when the record is wanted. */
+#define TRACE(levels, category, level, call) QN_TR_IF(levels, category, level, (atomic_fetch_add(&records, 1), (call)))
 
 /* An error goes into the error record of this thread first, and from there into the trace. */
 static void trace_unreadable(const char *component, qn_uint32_t id, const char *name, int error, qn_uint32_t line)
@@ -115,7 +122,7 @@ static void read_file(struct index *index, const char *name)
     FILE *file = fopen(name, "re");
     if (file == NULL) {
         ++index->unreadable;
-        QN_TR_IF(indx_levels, INDX_ERRORS, 1, (trace_unreadable("INDX", FILE_UNREADABLE, name, errno, __LINE__), 0));
+        TRACE(indx_levels, INDX_ERRORS, 1, trace_unreadable("INDX", FILE_UNREADABLE, name, errno, __LINE__));
         return;
     }
     const unsigned long lines = index->lines;
@@ -124,21 +131,20 @@ static void read_file(struct index *index, const char *name)
     size_t got = 0;
     while ((got = fread(buffer, 1, sizeof buffer, file)) > 0) {
         if (bytes == 0)
-            QN_TR_IF(indx_levels, INDX_CONTENT, 1,
-                     tr_record_data_1("INDX", FILE_BYTES, 1, (const void *)buffer, (int)(got < 32 ? got : 32)));
+            TRACE(indx_levels, INDX_CONTENT, 1,
+                  tr_record_data_1("INDX", FILE_BYTES, 1, (const void *)buffer, (int)(got < 32 ? got : 32)));
         bytes += got;
         count_text(index, buffer, got);
     }
     fclose(file);
     ++index->files;
     index->bytes += bytes;
-    QN_TR_IF(indx_levels, INDX_FILES, 1,
-             tr_record_values_64_1("INDX", FILE_READ, 3, (qn_int64_t)bytes, (qn_int64_t)(index->lines - lines),
-                                   (qn_int64_t)(index->words - words)));
-    QN_TR_IF(indx_levels, INDX_NAMES, 1, tr_ms_record_strings_1("INDX", FILE_NAME, indx_files[INDX_NAMES], 1, name));
-    QN_TR_IF(
-        indx_levels, INDX_CONTENT, 2,
-        tr_record_fmt_string_1("INDX", FILE_SUMMARY, "%s: %lu bytes, %lu lines", name, bytes, index->lines - lines));
+    TRACE(indx_levels, INDX_FILES, 1,
+          tr_record_values_64_1("INDX", FILE_READ, 3, (qn_int64_t)bytes, (qn_int64_t)(index->lines - lines),
+                                (qn_int64_t)(index->words - words)));
+    TRACE(indx_levels, INDX_NAMES, 1, tr_ms_record_strings_1("INDX", FILE_NAME, indx_files[INDX_NAMES], 1, name));
+    TRACE(indx_levels, INDX_CONTENT, 2,
+          tr_record_fmt_string_1("INDX", FILE_SUMMARY, "%s: %lu bytes, %lu lines", name, bytes, index->lines - lines));
 }
 
 /* ---- walking ---- */
@@ -169,7 +175,7 @@ static void put_folder(const char *name)
     const int length = ++queue.length;
     pthread_cond_signal(&queue.changed);
     pthread_mutex_unlock(&queue.lock);
-    QN_TR_IF(walk_levels, WALK_QUEUE, 1, tr_record_int32_1("WALK", QUEUE_LENGTH, length));
+    TRACE(walk_levels, WALK_QUEUE, 1, tr_record_int32_1("WALK", QUEUE_LENGTH, length));
 }
 
 /* The next folder; NULL when there are none and no thread can add any. */
@@ -190,13 +196,12 @@ static struct folder *take_folder(bool was_busy)
 
 static void read_folder(struct index *index, const char *folder_name)
 {
-    QN_TR_IF(walk_levels, WALK_FOLDERS, 1, tr_record_id_1("WALK", FOLDER_ENTERED));
-    QN_TR_IF(walk_levels, WALK_NAMES, 1, tr_record_fmt_string_1("WALK", FOLDER_NAME, "in %s", folder_name));
+    TRACE(walk_levels, WALK_FOLDERS, 1, tr_record_id_1("WALK", FOLDER_ENTERED));
+    TRACE(walk_levels, WALK_NAMES, 1, tr_record_fmt_string_1("WALK", FOLDER_NAME, "in %s", folder_name));
     DIR *folder = opendir(folder_name);
     if (folder == NULL) {
         ++index->unreadable;
-        QN_TR_IF(walk_levels, WALK_ERRORS, 1,
-                 (trace_unreadable("WALK", FOLDER_UNREADABLE, folder_name, errno, __LINE__), 0));
+        TRACE(walk_levels, WALK_ERRORS, 1, trace_unreadable("WALK", FOLDER_UNREADABLE, folder_name, errno, __LINE__));
         return;
     }
     const struct dirent *entry = NULL;
@@ -252,6 +257,7 @@ static void print_index(struct index *parts, int count)
     qsort(total->table, WORDS, sizeof *total->table, by_count);
     for (int w = 0; w < 5 && total->table[w].count > 0; ++w)
         printf("%10lu  %s\n", total->table[w].count, total->table[w].text);
+    printf("%lu records traced\n", (unsigned long)records);
 }
 
 static bool run_threads(struct index *parts, int count)

@@ -85,8 +85,8 @@ void spool_row::saw(const timespec &time)
 
 spool_row &spool_table::row_of(const spooled_copy &copy)
 {
-    // Counted from the copy: there are fewer folders on a node of no cluster, and more below a folder that holds several
-    // spool directories.
+    // Counted from the copy: there are fewer folders on a node of no cluster, and more below a folder that holds
+    // several spool directories.
     const std::size_t levels = std::min(copy.folders.size(), level_names.size());
     return rows_[{folder_names(copy.folders.end() - static_cast<std::ptrdiff_t>(levels), copy.folders.end()),
                   copy.name.trace}];

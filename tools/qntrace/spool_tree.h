@@ -4,9 +4,9 @@
 //
 //   SPOOL-DIRECTORY / cluster / cluster id / host / node id / program / app.trc.3.sp.2024_05_01_13_45_07.123456
 //
-// On a node of no cluster the first two are missing. Trees of any depth are walked, with one folder open at a time and
-// no memory for the copies themselves. Symbolic links to folders are followed, and no folder is entered twice, so that a
-// link that leads back ends there.
+// On a node of no cluster the first two are missing. Trees of any depth are walked, with one folder open at a time
+// and no memory for the copies themselves. Symbolic links to folders are followed, and no folder is entered twice, so
+// that a link that leads back ends there.
 #pragma once
 
 #include <cstdint>

@@ -21,7 +21,6 @@
 namespace
 {
 using namespace qn::tr;
-using format::record_header_bytes;
 
 constexpr qn_uint32_t switching_debug_level = 1; // lines are written above it
 

@@ -12,13 +12,19 @@ using namespace qn::tr;
 template <class Value>
 struct listed_values {
     argument_list values;
-    Value next() { return va_arg(values, Value); }
+    void copy_to(unsigned char *place, qn_uint32_t number)
+    {
+        for (qn_uint32_t i = 0; i < number; ++i, place += sizeof(Value)) {
+            const Value value = va_arg(values, Value);
+            std::memcpy(place, &value, sizeof value);
+        }
+    }
 };
 
 template <class Value>
 struct given_values {
     const Value *values;
-    Value next() { return *values++; }
+    void copy_to(unsigned char *place, qn_uint32_t number) { std::memcpy(place, values, number * sizeof(Value)); }
 };
 
 // Writes values straight from their source into the file.
@@ -49,11 +55,7 @@ struct values_writer : record_writer {
     {
         to->id = id;
         to->number = number;
-        unsigned char *place = body_of(to);
-        for (qn_uint32_t i = 0; i < number; ++i, place += sizeof(Value)) {
-            const Value value = source.next();
-            std::memcpy(place, &value, sizeof value);
-        }
+        source.copy_to(body_of(to), number);
     }
 };
 

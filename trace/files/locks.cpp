@@ -33,6 +33,18 @@ void cleanup_anchor_set(void *anchor) { unlock_anchor_set(static_cast<trace_anch
 
 namespace qn::tr
 {
+int lock_busy_mutex(pthread_mutex_t *mutex)
+{
+    constexpr int first_pauses = 8;
+    constexpr int last_pauses = 256;
+    for (int pauses = first_pauses; pauses <= last_pauses; pauses *= 2) {
+        for (int i = 0; i < pauses; ++i) __builtin_ia32_pause();
+        const int result = pthread_mutex_trylock(mutex);
+        if (result != EBUSY) return result;
+    }
+    return pthread_mutex_lock(mutex);
+}
+
 void reset_locks_in_child()
 {
     initialize_trace_global_data();

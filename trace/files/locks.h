@@ -15,7 +15,9 @@
 // cancellation unwinds the stack like an exception. So nothing between a guard and a cancellation point may be noexcept.
 #pragma once
 
+#include <cerrno>
 #include <pthread.h>
+#include <sys/single_threaded.h>
 
 #include "trace/files/anchor.h"
 #include "trace/files/shared_words.h"
@@ -96,13 +98,29 @@ inline pthread_mutex_t *anchor_set_mutex(trace_anchor_t *anchor)
     return shared != nullptr && load_relaxed(anchor->spool) != nullptr ? shared : &anchor->anchorMutex;
 }
 
+// Takes a mutex that another thread holds: tries for some microseconds, which is what a record takes, then waits.
+int lock_busy_mutex(pthread_mutex_t *mutex);
+
+// pthread_mutex_lock() for a lock that is held for an instant only. With two writers on one trace, to sleep and be woken
+// costs many times the record that was waited for. A process of one thread need not even use an atomic operation.
+inline int lock_briefly_held(pthread_mutex_t *mutex)
+{
+#ifdef __SANITIZE_THREAD__
+    return pthread_mutex_lock(mutex); // the order of locks is not learned from trying
+#else
+    if (__libc_single_threaded) return pthread_mutex_lock(mutex);
+    const int result = pthread_mutex_trylock(mutex);
+    return __builtin_expect(result == EBUSY, 0) ? lock_busy_mutex(mutex) : result;
+#endif
+}
+
 // Takes the anchor set lock and tells which mutex that was; the lock's result. A start may turn a single file into a
 // page set, whose lock is another one, while a thread waits: so it looks again when it has the mutex.
 inline int take_anchor_set(trace_anchor_t *anchor, pthread_mutex_t *&taken)
 {
     for (;;) {
         taken = anchor_set_mutex(anchor);
-        const int result = pthread_mutex_lock(taken);
+        const int result = lock_briefly_held(taken);
         if (__builtin_expect(result != 0 || taken == anchor_set_mutex(anchor), 1)) return result;
         pthread_mutex_unlock(taken);
     }

@@ -20,8 +20,7 @@ namespace fs = std::filesystem;
 
 constexpr uint32_t pages = 4;
 constexpr int longest_queue = static_cast<int>(pages) - 2;
-constexpr uint64_t some_rings =
-    3 * pages * (soak_trace::usual_page_bytes / 32); // records that fill the ring three times
+constexpr uint64_t some_rings = 3 * pages * (soak_trace::usual_page_bytes / 32); // records that fill it three times
 constexpr const char *mounted = "/var/spool";
 
 // Mounts a file system of so many bytes for spooling, in a /var of its own.
@@ -92,8 +91,8 @@ TEST(SpoolDirectory, OnAFullFileSystemGetsNoPartOfACopy)
 {
     on_a_disk_of("1m", [] {
         const soak_trace trace(pages, soak_trace::usual_page_bytes, mounted);
-        live_writers writers;
-        writers.wait_for(8 * some_rings);
+        live_writers writers(longest_queue); // every page is tried to be copied
+        writers.wait_for(some_rings);
         const auto written = writers.end();
         wait_for_queue(0);
         const auto copies = copies_in(mounted);

@@ -10,6 +10,7 @@
 
 #include "trace/files/error_report.h"
 #include "trace/files/locks.h"
+#include "trace/files/page_names.h"
 #include "trace/files/shared_words.h"
 #include "trace/files/text.h"
 
@@ -132,12 +133,10 @@ trace_anchor_t *findOrCreateAnchorForFile(const char *fileName, int createIfNeed
 int spool_name_match(const char *anchorFileName, const char *fileName)
 {
     const std::string_view name(anchorFileName);
-    const size_t suffix = name.find(".sp");
-    if (suffix == std::string_view::npos || suffix + 3 != name.size()) return -1;
-
-    const size_t before_digits = name.substr(0, suffix).find_last_not_of("0123456789");
-    if (before_digits == std::string_view::npos || before_digits + 1 == suffix || name[before_digits] != '.') return -1;
-    return name.substr(0, before_digits).compare(fileName);
+    const auto trace_name = trace_name_of_page(name);
+    // Only the first ".sp" counts: a page of a trace that is itself named "a.sp" is not known as one.
+    if (!trace_name || name.find(".sp") + 3 != name.size()) return -1;
+    return trace_name->compare(fileName);
 }
 
 trace_anchor_t *getSplAnchor(trace_anchor_t *headAnchor, const char *fileName)

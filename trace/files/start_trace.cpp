@@ -11,6 +11,7 @@
 #include "trace/files/error_report.h"
 #include "trace/files/library.h"
 #include "trace/files/locks.h"
+#include "trace/files/page_names.h"
 #include "trace/files/trace_file.h"
 #include "trace/recording/recording.h"
 #include "trace/spooling/spool.h"
@@ -19,21 +20,12 @@ namespace
 {
 using namespace qn::tr;
 
-// Bytes that "." and a page number and ".sp" may add to a trace's name.
-constexpr size_t page_suffix_bytes = sizeof ".4294967295.sp";
-
-// A page's name given back as a trace's name: cut at the second dot from its end.
-void cut_page_suffix(char *name)
+// A page's name given back as a trace's name.
+void reduce_to_trace_name(char *name)
 {
     const std::string_view text(name);
     const size_t suffix = text.find(".sp");
-    if (suffix == std::string_view::npos || suffix + 3 != text.size()) return;
-    int dots = 0;
-    for (size_t i = text.size() - 1; i > 0; --i) {
-        if (name[i] != '.' || ++dots < 2) continue;
-        name[i] = '\0';
-        return;
-    }
+    if (suffix != std::string_view::npos && suffix + 3 == text.size()) cut_at_second_last_dot(name);
 }
 
 // The expression is the interface: other programs reckon with its results.
@@ -61,15 +53,13 @@ qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
 
     char base_name[trace_file_name_bytes];
     std::memcpy(base_name, head->fileName, sizeof base_name);
-    cut_page_suffix(base_name);
-    if (std::strlen(base_name) + page_suffix_bytes > sizeof head->fileName)
-        return set_error_str(QN_TR_EFILENAME, 17, head->fileName);
+    reduce_to_trace_name(base_name);
+    if (!has_room_for_page_names(base_name)) return set_error_str(QN_TR_EFILENAME, 17, head->fileName);
 
     // A set taken apart leaves its mutex behind, in case a thread still waits for it.
     pthread_mutex_t *shared = head->pSpoolMutex != nullptr ? head->pSpoolMutex : new_recursive_mutex();
     if (shared == nullptr) return set_error(QN_TR_ENOMEM, 14);
-    const size_t room = sizeof head->fileName;
-    std::snprintf(head->fileName, room, "%.*s.1.sp", static_cast<int>(room - page_suffix_bytes), base_name);
+    name_page(head->fileName, base_name, 1);
     debug("creating page '%s'\n", head->fileName);
     store_relaxed(head->nextPage, head);
     head->pActivePg = head;
@@ -80,8 +70,7 @@ qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
     trace_anchor_t *last = head;
     for (qn_uint32_t number = 2; number <= pages; ++number) {
         char page_name[trace_file_name_bytes];
-        std::snprintf(page_name, sizeof page_name, "%.*s.%u.sp", static_cast<int>(room - page_suffix_bytes), base_name,
-                      number);
+        name_page(page_name, base_name, number);
         debug("creating page anchor '%s'\n", page_name);
         trace_anchor_t *page = getSplAnchor(head, page_name);
         if (page == nullptr) return -1;

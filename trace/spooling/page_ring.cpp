@@ -4,20 +4,18 @@
 //
 // A page that was cut off is chained by `next`, which pages of a ring do not use; its `nextPage` is null, so that a
 // writer who is still in it goes on to the head.
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 
 #include "trace/files/library.h"
 #include "trace/files/locks.h"
+#include "trace/files/page_names.h"
 #include "trace/files/trace_file.h"
 #include "trace/spooling/spool_list.h"
 
 namespace
 {
 using namespace qn::tr;
-
-constexpr size_t page_suffix_bytes = sizeof ".4294967295.sp";
 
 qn_uint8_t state_of(trace_anchor_t *page) { return load_relaxed(header_of(page)->sp_flags); }
 
@@ -107,17 +105,6 @@ void start_new_page(trace_anchor_t *head, trace_anchor_t *page)
     store_relaxed(header_of(page)->sp_flags, format::page_state::ready);
 }
 
-// The trace's name: the page's, up to the second dot from its end.
-void cut_page_suffix(char *name)
-{
-    int dots = 0;
-    for (size_t i = std::strlen(name); i-- > 0;) {
-        if (name[i] != '.' || ++dots < 2) continue;
-        name[i] = '\0';
-        return;
-    }
-}
-
 // Closes the ring behind its `pages`th page, and releases what is cut off.
 void cut_ring(trace_anchor_t *head, qn_uint32_t pages)
 {
@@ -163,8 +150,8 @@ trace_anchor_t *add_new_pages(trace_anchor_t *p_anchor, trace_spool_spec_t *p_ol
 {
     char base_name[trace_file_name_bytes];
     std::memcpy(base_name, p_anchor->fileName, sizeof base_name);
-    cut_page_suffix(base_name);
-    if (std::strlen(base_name) + page_suffix_bytes > sizeof base_name) return nullptr;
+    cut_at_second_last_dot(base_name);
+    if (!has_room_for_page_names(base_name)) return nullptr;
 
     trace_anchor_t *first_new = nullptr;
     trace_anchor_t *last_new = nullptr;
@@ -179,8 +166,7 @@ trace_anchor_t *add_new_pages(trace_anchor_t *p_anchor, trace_spool_spec_t *p_ol
     };
     for (qn_uint32_t number = p_old_spool_spec->pages + 1; number <= p_new_spool_spec->pages; ++number) {
         char page_name[trace_file_name_bytes];
-        std::snprintf(page_name, sizeof page_name, "%.*s.%u.sp", static_cast<int>(sizeof page_name - page_suffix_bytes),
-                      base_name, number);
+        name_page(page_name, base_name, number);
         if (is_in_ring(p_anchor, page_name)) continue;
         trace_anchor_t *page = take_back(p_anchor, page_name);
         if (page == nullptr) page = getSplAnchor(p_anchor, page_name);

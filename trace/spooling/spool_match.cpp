@@ -7,23 +7,13 @@
 #include "trace/files/debug.h"
 #include "trace/files/library.h"
 #include "trace/files/locks.h"
+#include "trace/files/page_names.h"
 #include "trace/files/text.h"
 #include "trace/spooling/spool_list.h"
 
 namespace
 {
 using namespace qn::tr;
-
-// A page goes by its trace's name: "/x/y.trc.3.sp" is matched as "/x/y.trc".
-std::string_view without_page_suffix(std::string_view name)
-{
-    constexpr std::string_view ending = ".sp";
-    if (!name.ends_with(ending)) return name;
-    const std::string_view stem = name.substr(0, name.size() - ending.size());
-    const size_t before_digits = stem.find_last_not_of("0123456789");
-    if (before_digits == std::string_view::npos || before_digits + 1 == stem.size()) return name;
-    return stem[before_digits] == '.' ? stem.substr(0, before_digits) : name;
-}
 
 bool matches(const trace_spool_spec_t *spec, const char *trc_file)
 {
@@ -72,8 +62,8 @@ char *for_the_client(const char *directory)
 
 trace_spool_spec_t *match_spool_file_name(const char *trc_file, trace_spool_spec_t *pFirstSpoolSpec)
 {
-    char name[trace_file_name_bytes];
-    copy_cut(name, without_page_suffix(trc_file));
+    char name[trace_file_name_bytes]; // a page goes by its trace's
+    copy_cut(name, trace_name_of_page(trc_file).value_or(trc_file));
 
     trace_spool_spec_t *spec = pFirstSpoolSpec;
     while (spec != nullptr && !(matches(spec, name) && spec->pages > 1)) spec = spec->pNext;

@@ -1,9 +1,13 @@
-// qntrace dump: prints trace files whole.
+// qntrace dump: prints trace files, or the records of them that are asked for.
 #include <algorithm>
-#include <cstring>
+#include <cstdlib>
 #include <memory>
+#include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
+
+#include <unistd.h>
 
 #include <fmt/format.h>
 
@@ -13,6 +17,9 @@
 #include "tools/qntrace/findings.h"
 #include "tools/qntrace/output.h"
 #include "tools/qntrace/reader/reader.h"
+#include "tools/qntrace/select.h"
+#include "tools/qntrace/select_last.h"
+#include "tools/qntrace/select_number.h"
 
 namespace qn::dump
 {
@@ -23,23 +30,56 @@ struct dump_options {
     bool json = false;
     bool raw = false;
     bool utc = false;
+    std::string color = "auto";
+    std::optional<std::size_t> last;
+    std::shared_ptr<const selection> selected;
     std::vector<std::string> files;
 };
 
+bool is_set(const char *variable)
+{
+    const char *value = std::getenv(variable);
+    return value != nullptr && *value != '\0';
+}
+
+bool is_dumb_terminal()
+{
+    const char *terminal = std::getenv("TERM");
+    return terminal != nullptr && std::string_view(terminal) == "dumb";
+}
+
+// What is not asked for by the option, only a terminal gets, and nobody who has said that he wants none.
+bool wants_color(const std::string &choice)
+{
+    if (choice != "auto") return choice == "always";
+    return !is_set("NO_COLOR") && !is_dumb_terminal() && isatty(STDOUT_FILENO) != 0;
+}
+
 // Prints one file; `Format` is text_dump or json_dump.
 template <typename Format>
-void dump_records(const std::string &path, reader::trace_reader &trace, Format &format, bool raw)
+void dump_records(const std::string &path, reader::trace_reader &trace, Format &format, const dump_options &options)
 {
     if (!trace.header()) return;
     std::string line;
     format.header(line, path, *trace.header());
     write_data(line);
-    while (const auto record = trace.next()) {
-        if (!raw && !reader::carries_data(record->body)) continue;
+    const auto print = [&](const reader::trace_record &record) {
         line.clear();
-        format.record(line, *record);
+        format.record(line, record);
         write_data(line);
+    };
+    const trace_origin origin{path, *trace.header()};
+    last_records newest(options.last.value_or(0));
+    while (const auto record = trace.next()) {
+        if (!options.raw && !reader::carries_data(record->body)) continue;
+        if (!options.selected->admits(origin, *record)) continue;
+        if (options.last) {
+            newest.keep(*record);
+        } else {
+            print(*record);
+        }
     }
+    newest.for_each(print);
 }
 
 int dump_file(const std::string &path, const dump_options &options, bool first)
@@ -51,11 +91,11 @@ int dump_file(const std::string &path, const dump_options &options, bool first)
         reader::trace_reader trace(source, std::ref(findings));
         if (options.json) {
             json_dump format({options.raw, options.utc});
-            dump_records(path, trace, format, options.raw);
+            dump_records(path, trace, format, options);
         } else {
             if (!first && trace.header()) write_data("\n");
-            text_dump format({options.raw, options.utc, locale_charset()});
-            dump_records(path, trace, format, options.raw);
+            text_dump format({options.raw, options.utc, locale_charset(), wants_color(options.color)});
+            dump_records(path, trace, format, options);
         }
     } catch (const reader::io_error &error) {
         write_message(fmt::format("{}: {}", printable_name(path), error.what()));
@@ -63,6 +103,17 @@ int dump_file(const std::string &path, const dump_options &options, bool first)
     }
     findings.finish();
     return std::max(status, findings.status());
+}
+
+void add_last_option(CLI::App &command, std::optional<std::size_t> &last)
+{
+    const auto take = [&last](const std::string &number) {
+        last = parse_number(number);
+        if (!last) throw CLI::ValidationError("--last", "expected a number");
+    };
+    command.add_option_function<std::string>("--last", take, "Of the selected records only the newest N of each file")
+        ->type_name("N")
+        ->group("Selection");
 }
 
 int dump_files(const dump_options &options)
@@ -86,6 +137,11 @@ void add_dump_command(CLI::App &app, int &status)
                       "Also print fillers and unfinished records, and with every record its offset, its length\n"
                       "and the fields of its header as they are stored");
     command->add_flag("--utc", options->utc, "Print times in UTC instead of the local time zone");
+    command->add_option("--color", options->color, "Whether the text is coloured; auto: on a terminal")
+        ->type_name("WHEN")
+        ->check(CLI::IsMember({"auto", "always", "never"}));
+    options->selected = add_selection_options(*command);
+    add_last_option(*command, options->last);
     command->add_option("FILE", options->files, "Trace files: live ones, pages, or copies")->required();
     command->callback([options, &status] { status = dump_files(*options); });
 }

@@ -248,12 +248,13 @@ void json_dump::header(std::string &out, std::string_view path, const reader::fi
     });
 }
 
-void json_dump::record(std::string &out, const reader::trace_record &record)
+void json_dump::record(std::string &out, const reader::trace_record &record, const text_members &origin)
 {
     const auto &header = record.raw.header;
     const auto time = record.time ? timestamps_.text(*record.time) : std::nullopt;
     append_object(out, [&](text_encoder &encode) {
         json object = {{"type", "record"}};
+        for (const auto &[name, value] : origin) object[name] = encode.text(value);
         object["time"] = number_or_null(time);
         object["time_ns"] = record.time ? json(nanoseconds_text(*record.time)) : json(nullptr);
         object["seq"] = header.seq;

@@ -9,6 +9,8 @@
 
 #include <string>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 #include "tools/qntrace/reader/reader.h"
 #include "tools/qntrace/timestamps.h"
@@ -21,6 +23,9 @@ struct json_options {
     bool utc = false;
 };
 
+// Names and values of members.
+using text_members = std::vector<std::pair<const char *, std::string>>;
+
 class json_dump
 {
 public:
@@ -28,7 +33,8 @@ public:
 
     // Both append one line to `out`.
     void header(std::string &out, std::string_view path, const reader::file_header &header);
-    void record(std::string &out, const reader::trace_record &record);
+    // `origin` names where a record of several files comes from: members that stand before the record's own.
+    void record(std::string &out, const reader::trace_record &record, const text_members &origin = {});
 
 private:
     json_options options_;

@@ -15,12 +15,30 @@ namespace
 constexpr std::size_t kind_width = 11;
 constexpr std::size_t component_width = 4;
 
+// What tells a terminal to change the colour. Text out of a file has its escapes spelt out, and changes nothing.
+constexpr std::string_view cyan = "\x1b[36m";
+constexpr std::string_view green = "\x1b[32m";
+constexpr std::string_view red = "\x1b[1;31m";
+constexpr std::string_view yellow = "\x1b[1;33m";
+constexpr std::string_view usual = "\x1b[m";
+
 void append(std::string &out, std::string_view text) { out += text; }
 
 template <typename... Values>
 void append(std::string &out, fmt::format_string<const Values &...> text, const Values &...values)
 {
     fmt::format_to(std::back_inserter(out), text, values...);
+}
+
+// The colour of what a reader looks for: errors and damage, and notices; none for other records.
+std::string_view alarm_color(const reader::trace_record &record)
+{
+    if (!record.problem.empty() || std::holds_alternative<reader::error_body>(record.body)) return red;
+    if (std::holds_alternative<reader::page_note_body>(record.body) ||
+        std::holds_alternative<reader::restart_body>(record.body)) {
+        return yellow;
+    }
+    return {};
 }
 
 std::string_view order_name(reader::byte_order order)
@@ -107,8 +125,23 @@ void text_dump::record(std::string &out, const reader::trace_record &record)
     time_column(out, record);
     append(out, "  {:>8}  {:#010x}  ", header.seq, header.thread);
     component_column(out, header);
-    append(out, "  {:<{}}  ", kind_name(record.body), kind_width);
+    out += "  ";
+    kind_and_body(out, record);
+}
+
+void text_dump::kind_and_body(std::string &out, const reader::trace_record &record) const
+{
+    const auto alarm = alarm_color(record);
+    const auto kind = kind_name(record.body);
+    begin_color(out, alarm.empty() ? green : alarm);
+    out += kind;
+    end_color(out);
+    out.append(kind_width - kind.size() + 2, ' ');
+    const auto begin = out.size();
     append_body(out, record, {options_.raw, options_.printable});
+    if (alarm.empty() || out.size() <= begin + 1) return; // there is no body, and the blanks before it are gone
+    const auto end = out.size() - 1;                      // the end of its last line
+    if (options_.color) out.insert(end, usual).insert(begin, alarm);
 }
 
 void text_dump::time_column(std::string &out, const reader::trace_record &record)
@@ -123,12 +156,24 @@ void text_dump::time_column(std::string &out, const reader::trace_record &record
 
 void text_dump::component_column(std::string &out, const reader::record_header &header) const
 {
+    begin_color(out, cyan);
     const auto begin = out.size();
     append_escaped(
         out, options_.raw ? std::string_view(header.component.data(), header.component.size()) : component_name(header),
         options_.printable);
     const auto width = out.size() - begin;
+    end_color(out);
     if (width < component_width) out.append(component_width - width, ' ');
+}
+
+void text_dump::begin_color(std::string &out, std::string_view color) const
+{
+    if (options_.color) out += color;
+}
+
+void text_dump::end_color(std::string &out) const
+{
+    if (options_.color) out += usual;
 }
 
 std::string text_dump::seconds_text(std::uint32_t seconds)

@@ -21,10 +21,12 @@ int run(int argc, char **argv)
     CLI::App app("Reads the trace files of libqn_tr.", "qntrace");
     app.set_version_flag("--version", "qntrace " QNTRACE_VERSION, "Print the version and exit");
     app.require_subcommand(1);
-    app.footer("Exit status: 0 all sound, 1 some file is damaged (what is sound is shown),\n"
+    app.footer("Exit status: 0 all sound, 1 some file is damaged or faulty (what is sound is shown),\n"
                "2 wrong usage, 3 a file cannot be read.");
     qn::dump::add_dump_command(app, status);
     qn::dump::add_info_command(app, status);
+    qn::dump::add_merge_command(app, status);
+    qn::dump::add_stats_command(app, status);
     qn::dump::add_spool_command(app, status);
     qn::dump::add_config_command(app, status);
     try {

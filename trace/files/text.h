@@ -11,7 +11,7 @@ namespace qn::tr
 inline void copy_cut(char *field, size_t field_bytes, std::string_view text)
 {
     const size_t length = std::min(text.size(), field_bytes - 1);
-    std::memmove(field, text.data(), length);
+    if (length != 0) std::memmove(field, text.data(), length); // an empty text may be nowhere
     field[length] = '\0';
 }
 

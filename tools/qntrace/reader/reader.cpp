@@ -6,8 +6,30 @@
 
 namespace qn::reader
 {
+namespace
+{
 
-trace_reader::trace_reader(byte_source &source, finding_sink report) : report_(std::move(report)), window_(source)
+using qn::tr::format::kind;
+
+// Whether a record concerns nobody but those who want to see its body.
+bool is_ordinary(const record_header &header)
+{
+    switch (static_cast<kind>(header.function)) {
+    case kind::identifier:
+    case kind::page_note:
+    case kind::data_blocks:
+    case kind::values_32:
+    case kind::values_64:
+    case kind::error:
+    case kind::strings: return true;
+    default: return false;
+    }
+}
+
+} // namespace
+
+trace_reader::trace_reader(byte_source &source, finding_sink report, std::size_t window_bytes)
+    : report_(std::move(report)), window_(source, window_bytes)
 {
     header_ = read_header(window_, report_);
     if (!header_) return;
@@ -26,17 +48,38 @@ std::optional<trace_record> trace_reader::next()
     if (!raw) return std::nullopt;
     trace_record record;
     record.raw = *raw;
-    auto decoded = decode(*raw);
+    auto decoded = decode_and_report(*raw);
     record.body = std::move(decoded.body);
     record.problem = std::move(decoded.problem);
-    if (!record.problem.empty()) {
-        report_({finding::severity::damage, raw->offset,
-                 fmt::format("{} (sequence number {})", record.problem, raw->header.seq)});
-    }
-    time_base_->pass(record.body);
-    // A filler's header beyond its length, kind and sequence number is what happened to stand there.
-    if (!std::holds_alternative<free_body>(record.body)) record.time = time_base_->time_of(raw->header.counter);
+    record.time = time_of(raw->header);
     return record;
+}
+
+std::optional<undecoded_record> trace_reader::next_undecoded()
+{
+    if (!walk_) return std::nullopt;
+    const auto raw = walk_->next();
+    if (!raw) return std::nullopt;
+    if (raw->oversized || !is_ordinary(raw->header)) decode_and_report(*raw);
+    return undecoded_record{*raw, time_of(raw->header)};
+}
+
+decoded_record trace_reader::decode_and_report(const raw_record &raw)
+{
+    auto decoded = decode(raw);
+    if (!decoded.problem.empty()) {
+        report_({finding::severity::damage, raw.offset,
+                 fmt::format("{} (sequence number {})", decoded.problem, raw.header.seq)});
+    }
+    time_base_->pass(decoded.body);
+    return decoded;
+}
+
+// A filler's header beyond its length, kind and sequence number is what happened to stand there.
+std::optional<timespec> trace_reader::time_of(const record_header &header) const
+{
+    if (header.function == static_cast<std::uint16_t>(kind::free_space)) return std::nullopt;
+    return time_base_->time_of(header.counter);
 }
 
 } // namespace qn::reader

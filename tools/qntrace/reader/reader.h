@@ -26,11 +26,16 @@ struct trace_record {
     std::optional<timespec> time; // absent for a filler, and when no usable time base is in force
 };
 
+struct undecoded_record {
+    raw_record raw;
+    std::optional<timespec> time; // as above
+};
+
 class trace_reader
 {
 public:
-    // The source must outlive the reader.
-    trace_reader(byte_source &source, finding_sink report);
+    // The source must outlive the reader. Who reads many files at a time gives each a smaller window.
+    trace_reader(byte_source &source, finding_sink report, std::size_t window_bytes = window::window_bytes);
     trace_reader(const trace_reader &) = delete;
     trace_reader &operator=(const trace_reader &) = delete;
 
@@ -39,8 +44,14 @@ public:
 
     // Fillers and unfinished records included. What the record refers to is valid until the next call.
     std::optional<trace_record> next();
+    // The same without the body, for who only counts: bodies are looked at where they tell the time, or that something
+    // is wrong with the record as a whole.
+    std::optional<undecoded_record> next_undecoded();
 
 private:
+    decoded_record decode_and_report(const raw_record &raw);
+    std::optional<timespec> time_of(const record_header &header) const;
+
     finding_sink report_;
     window window_;
     std::optional<file_header> header_;

@@ -57,7 +57,7 @@ std::span<const std::byte> window::fetch(std::uint64_t offset, std::size_t count
     const bool inside = offset >= start_ && offset - start_ <= filled_ && count <= filled_ - (offset - start_);
     if (!inside) {
         filled_ = 0; // read_at() may throw and leave the buffer half written
-        const std::size_t usual = std::min<std::uint64_t>(window_bytes, source_.size());
+        const std::size_t usual = std::min<std::uint64_t>(usual_bytes_, source_.size());
         buffer_.resize(std::max({buffer_.size(), usual, count}));
         filled_ = source_.read_at(offset, buffer_);
         start_ = offset;

@@ -63,13 +63,16 @@ private:
     std::span<const std::byte> bytes_;
 };
 
-// A copy of one stretch of a source. It is as long as window_bytes, or as the longest stretch ever asked for.
+// A copy of one stretch of a source. It is as long as whoever makes it wants, or as the longest stretch ever asked for.
 class window
 {
 public:
     static constexpr std::size_t window_bytes = 256 * 1024;
 
-    explicit window(byte_source &source) : source_(source) {}
+    explicit window(byte_source &source, std::size_t usual_bytes = window_bytes)
+        : source_(source), usual_bytes_(usual_bytes)
+    {
+    }
 
     std::uint64_t source_size() const { return source_.size(); }
     // `count` bytes from `offset` on, fewer only where the source ends. Valid until the next call.
@@ -79,6 +82,7 @@ public:
 
 private:
     byte_source &source_;
+    std::size_t usual_bytes_;
     std::vector<std::byte> buffer_;
     std::uint64_t start_ = 0;
     std::size_t filled_ = 0;

@@ -1,0 +1,146 @@
+// qntrace stats: how many records there are, of what, when, and how many are missing.
+#include <algorithm>
+#include <functional>
+#include <memory>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include <fmt/format.h>
+
+#include "tools/qntrace/commands.h"
+#include "tools/qntrace/durations.h"
+#include "tools/qntrace/findings.h"
+#include "tools/qntrace/output.h"
+#include "tools/qntrace/reader/reader.h"
+#include "tools/qntrace/select.h"
+#include "tools/qntrace/stats_report.h"
+#include "tools/qntrace/stats_tally.h"
+#include "tools/qntrace/trace_set.h"
+
+namespace qn::dump
+{
+namespace
+{
+
+constexpr std::size_t usual_top = 10;
+
+struct stats_options {
+    bool json = false;
+    stats_format format = {false, usual_top};
+    std::string bucket; // as given; empty: not
+    std::vector<std::string> files;
+    std::shared_ptr<const selection> selected;
+    std::function<bool()> selects; // whether any records are left out
+};
+
+bool carries_data(const reader::raw_record &record)
+{
+    using qn::tr::format::kind;
+    const auto what = static_cast<kind>(record.header.function);
+    return what != kind::free_space && what != kind::being_written;
+}
+
+// Counts the whole file without decoding its records.
+void count_all(reader::trace_reader &trace, stats_tally &tally, loss_counter &lost)
+{
+    while (const auto record = trace.next_undecoded()) {
+        const std::uint64_t missing = lost.pass(record->raw);
+        if (carries_data(record->raw)) tally.add(record->raw, record->time, missing);
+    }
+}
+
+// What is lost is counted as well, whatever is selected: nobody knows what it was.
+void count_selected(const trace_origin &origin, reader::trace_reader &trace, const selection &selected,
+                    stats_tally &tally, loss_counter &lost)
+{
+    while (const auto record = trace.next()) {
+        const std::uint64_t missing = lost.pass(record->raw);
+        if (carries_data(record->raw) && selected.admits(origin, *record))
+            tally.add(record->raw, record->time, missing);
+    }
+}
+
+int count_file(const std::string &path, const stats_options &options, stats_tally &tally)
+{
+    finding_printer findings(path);
+    int status = status_sound;
+    try {
+        reader::file_source source(path);
+        reader::trace_reader trace(source, std::ref(findings));
+        if (trace.header()) {
+            loss_counter lost(*trace.header());
+            if (options.selects())
+                count_selected({path, *trace.header()}, trace, *options.selected, tally, lost);
+            else
+                count_all(trace, tally, lost);
+            tally.lost.add(lost.so_far());
+            ++tally.files;
+        }
+    } catch (const reader::io_error &error) {
+        write_message(fmt::format("{}: {}", printable_name(path), error.what()));
+        status = status_io_error;
+    }
+    findings.finish();
+    return std::max(status, findings.status());
+}
+
+// Throws std::invalid_argument.
+std::optional<std::int64_t> bucket_width(const std::string &text)
+{
+    if (text.empty()) return std::nullopt;
+    const auto width = parse_duration(text);
+    if (!width || *width <= 0) throw std::invalid_argument("--bucket takes a duration, like 1s or 250us");
+    return width;
+}
+
+int show_stats(const stats_options &options)
+{
+    try {
+        stats_tally tally(bucket_width(options.bucket));
+        const trace_set set = find_traces(options.files);
+        int status = set.status;
+        for (const trace_source &source : set.sources)
+            status = std::max(status, count_file(source.path, options, tally));
+        tally.buckets.finish();
+        write_data(options.json ? stats_json(tally, options.format) : stats_text(tally, options.format));
+        flush_data();
+        return status;
+    } catch (const std::invalid_argument &error) {
+        write_message(error.what());
+        return status_usage;
+    }
+}
+
+} // namespace
+
+void add_stats_command(CLI::App &app, int &status)
+{
+    const auto options = std::make_shared<stats_options>();
+    auto *command = app.add_subcommand("stats", "Count records, bytes and losses");
+    command->add_flag("--json", options->json, "Print one JSON object a line instead of text");
+    command->add_flag("--utc", options->format.utc, "Print times in UTC instead of the local time zone");
+    command->add_option("--bucket", options->bucket, "Count by stretches of time of this length; chosen when not given")
+        ->type_name("DURATION");
+    command
+        ->add_option("--top", options->format.top,
+                     fmt::format("How many components, ids and threads to show, {} unless given; 0: all", usual_top))
+        ->type_name("N");
+    const auto before_selection = command->get_options().size();
+    options->selected = add_selection_options(*command);
+    const auto all = command->get_options();
+    const std::vector<const CLI::Option *> selecting(all.begin() + static_cast<std::ptrdiff_t>(before_selection),
+                                                     all.end());
+    options->selects = [selecting] {
+        return std::any_of(selecting.begin(), selecting.end(),
+                           [](const CLI::Option *option) { return option->count() > 0; });
+    };
+    command
+        ->add_option("FILE", options->files,
+                     "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"
+                     "copies below them and the trace files in them")
+        ->required();
+    command->callback([options, &status] { status = show_stats(*options); });
+}
+
+} // namespace qn::dump

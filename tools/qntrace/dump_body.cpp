@@ -13,8 +13,6 @@ namespace
 {
 
 constexpr std::string_view indent = "    ";
-constexpr std::uint32_t id_of_no_id = 0xFFFFFFFF; // what the writers without an id store
-
 class body_writer
 {
 public:

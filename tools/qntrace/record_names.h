@@ -10,6 +10,8 @@
 namespace qn::dump
 {
 
+inline constexpr std::uint32_t id_of_no_id = 0xFFFFFFFF; // what the writers without an id store
+
 std::string_view kind_name(const reader::record_body &body);
 std::string_view argument_type_name(reader::argument_type type);
 // Nothing for a value that is no state.

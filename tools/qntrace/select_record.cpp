@@ -12,8 +12,6 @@ namespace qn::dump
 namespace
 {
 
-constexpr std::uint32_t id_of_no_id = 0xFFFFFFFF; // what the writers without an id store
-
 template <std::size_t... Index>
 std::vector<std::string_view> names_of_all(std::index_sequence<Index...>)
 {

@@ -16,7 +16,6 @@ namespace
 using qn::tr::format::kind;
 
 constexpr std::size_t most_keys = std::size_t{1} << 20;
-constexpr std::uint32_t id_of_no_id = 0xFFFFFFFF;                  // what the writers without an id store
 constexpr std::uint64_t unknown_kind = 0x10000;                    // above all kinds
 constexpr std::size_t id_at = qn::tr::format::record_header_bytes; // in all kinds that have one
 

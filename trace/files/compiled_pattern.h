@@ -23,13 +23,13 @@ public:
         if (result_ == 0) regfree(&regex_);
     }
     explicit operator bool() const { return result_ == 0; }
-    bool matches(const char *text) const { return regexec(&regex_, text, 0, nullptr, 0) == 0; }
 
-    // With the places of the whole match and its groups; compiled with flags 0.
-    bool matches(const char *text, std::span<regmatch_t> places) const
+    // What regexec() returns; with the places of the whole match and its groups, when compiled with flags 0.
+    int compare(const char *text, std::span<regmatch_t> places = {}) const
     {
-        return regexec(&regex_, text, places.size(), places.data(), 0) == 0;
+        return regexec(&regex_, text, places.size(), places.data(), 0);
     }
+    bool matches(const char *text, std::span<regmatch_t> places = {}) const { return compare(text, places) == 0; }
 
 private:
     regex_t regex_{};

@@ -12,6 +12,7 @@
 #include "trace/components/specifications.h"
 #include "trace/files/debug.h"
 #include "trace/files/locks.h"
+#include "trace/files/text.h"
 #include "trace/spooling/spool.h"
 
 int global_switch = 0;
@@ -35,10 +36,7 @@ const char *environment(const char *name)
 void add_to_file_name(trace_anchor_t *anchor, const char *text)
 {
     const size_t length = std::strlen(anchor->fileName);
-    const size_t room = sizeof anchor->fileName - 1 - length;
-    const size_t added = strnlen(text, room);
-    std::memcpy(anchor->fileName + length, text, added);
-    anchor->fileName[length + added] = '\0';
+    copy_cut(anchor->fileName + length, sizeof anchor->fileName - length, text);
 }
 
 void name_default_file(trace_anchor_t *anchor, const char *name)

@@ -61,27 +61,19 @@ public:
     explicit operator bool() const { return result_ == 0; }
     int result() const { return result_; }
 
+protected:
+    mutex_lock(pthread_mutex_t &mutex, int result) : mutex_(&mutex), result_(result) {}
+
 private:
     pthread_mutex_t *mutex_;
     int result_;
 };
 
 // Holds a plain mutex if it is free, or this thread's already; never waits. Test it.
-class mutex_try_lock
+class mutex_try_lock : public mutex_lock
 {
 public:
-    explicit mutex_try_lock(pthread_mutex_t &mutex) : mutex_(&mutex), result_(pthread_mutex_trylock(&mutex)) {}
-    mutex_try_lock(const mutex_try_lock &) = delete;
-    mutex_try_lock &operator=(const mutex_try_lock &) = delete;
-    ~mutex_try_lock()
-    {
-        if (result_ == 0) mutex_cleanup(mutex_);
-    }
-    explicit operator bool() const { return result_ == 0; }
-
-private:
-    pthread_mutex_t *mutex_;
-    int result_;
+    explicit mutex_try_lock(pthread_mutex_t &mutex) : mutex_lock(mutex, pthread_mutex_trylock(&mutex)) {}
 };
 
 // Holds the global mutex.

@@ -16,6 +16,7 @@
 #include "trace/files/error_report.h"
 #include "trace/files/library.h"
 #include "trace/files/locks.h"
+#include "trace/files/text.h"
 #include "trace/files/trace_file.h"
 #include "trace/recording/recording.h"
 
@@ -140,14 +141,6 @@ qn_int32_t map_file_at_size(trace_anchor_t *anchor, start_in_progress &start, qn
 void map_every_page_now(const trace_anchor_t *anchor)
 {
     madvise(anchor->pMap, anchor->uActualFileSize, MADV_POPULATE_WRITE);
-}
-
-// Copies at most size - 1 characters and pads with NULs.
-template <size_t size>
-void copy_cut(char (&field)[size], const char *text)
-{
-    std::memset(field, 0, size);
-    std::memcpy(field, text, strnlen(text, size - 1));
 }
 
 program_names names_of_this_program()

@@ -9,15 +9,6 @@ namespace qn::tr
 {
 namespace
 {
-// In the order of the codes for one that does not compile: 42, 43, 44.
-constexpr const char *texts[] = {
-    "^(.+):.*$",
-    "^[ \t]*([-_a-zA-Z]+)[ \t]*=[ \t]*([-_a-zA-Z0-9/*.]+[$]*)[ \t]*$",
-    "^.*#.*",
-};
-enum { header_pattern, pair_pattern, comment_pattern };
-constexpr qn_int32_t first_pattern_code = 42;
-
 std::string_view part(const char *text, const regmatch_t &match)
 {
     return {text + match.rm_so, static_cast<size_t>(match.rm_eo - match.rm_so)};
@@ -43,19 +34,11 @@ const char *conf_lines::text() const
     return text;
 }
 
-conf_patterns::~conf_patterns()
+qn_int32_t conf_patterns::status() const
 {
-    while (count_ > 0) regfree(&compiled_[--count_]);
-}
-
-qn_int32_t conf_patterns::compile()
-{
-    for (const char *text : texts) {
-        if (regcomp(&compiled_[count_], text, REG_EXTENDED | REG_ICASE | REG_NEWLINE) != 0)
-            return first_pattern_code + count_;
-        ++count_;
-    }
-    return 0;
+    if (!header_) return 42;
+    if (!pair_) return 43;
+    return comment_ ? 0 : 44;
 }
 
 // A pair has no ":" and so is never a header.
@@ -63,19 +46,19 @@ qn_int32_t conf_patterns::classify(const char *text, conf_line &line) const
 {
     regmatch_t match[3];
     line = {.text = text};
-    int result = regexec(&compiled_[comment_pattern], text, 0, nullptr, 0);
+    int result = comment_.compare(text);
     if (result == 0) {
         line.type = conf_line_type::comment;
         return 0;
     }
-    if (result == REG_NOMATCH) result = regexec(&compiled_[pair_pattern], text, 3, match, 0);
+    if (result == REG_NOMATCH) result = pair_.compare(text, match);
     if (result == 0) {
         line.type = conf_line_type::pair;
         line.key = part(text, match[1]);
         line.value = part(text, match[2]);
         return 0;
     }
-    if (result == REG_NOMATCH) result = regexec(&compiled_[header_pattern], text, 2, match, 0);
+    if (result == REG_NOMATCH) result = header_.compare(text, match);
     if (result == 0) {
         line.type = conf_line_type::header;
         line.name = part(text, match[1]);

@@ -5,7 +5,8 @@
 #include <string_view>
 
 #include <qn_tr.h>
-#include <regex.h>
+
+#include "trace/files/compiled_pattern.h"
 
 namespace qn::tr
 {
@@ -40,16 +41,12 @@ struct conf_line {
 class conf_patterns
 {
 public:
-    conf_patterns() = default;
-    conf_patterns(const conf_patterns &) = delete;
-    conf_patterns &operator=(const conf_patterns &) = delete;
-    ~conf_patterns();
-
-    qn_int32_t compile();                                         // 0, 42, 43 or 44; once
+    qn_int32_t status() const;                                    // 0, or 42, 43, 44: which did not compile
     qn_int32_t classify(const char *text, conf_line &line) const; // 0, or 14 after recording it
 
 private:
-    regex_t compiled_[3] = {};
-    int count_ = 0;
+    const compiled_pattern header_{"^(.+):.*$", 0};
+    const compiled_pattern pair_{"^[ \t]*([-_a-zA-Z]+)[ \t]*=[ \t]*([-_a-zA-Z0-9/*.]+[$]*)[ \t]*$", 0};
+    const compiled_pattern comment_{"^.*#.*", 0};
 };
 } // namespace qn::tr

@@ -228,8 +228,8 @@ qn_int32_t read_conf_file(const char *file_name, trace_raw_config_t **config, co
     // "c": reading is no cancellation point, so that a cancelled thread leaves no stream behind.
     const file_ptr file(std::fopen(file_name, "rce"));
     if (file == nullptr) return QN_TR_ECONFOPEN;
-    conf_patterns patterns;
-    qn_int32_t status = patterns.compile();
+    const conf_patterns patterns;
+    qn_int32_t status = patterns.status();
     if (status != 0) return status;
     config_ptr result(static_cast<trace_raw_config_t *>(std::calloc(1, sizeof(trace_raw_config_t))));
     if (result == nullptr) return set_error(QN_TR_ENOMEM, 14);

@@ -1,7 +1,7 @@
 // What may reach a terminal.
 #include <gtest/gtest.h>
 
-#include "tools/qntrace/escape.h"
+#include "tools/qntrace/format/escape.h"
 
 namespace qn::dump
 {

@@ -9,7 +9,7 @@
 
 #include "reader/program.h"
 #include "reader/trace_builder.h"
-#include "tools/qntrace/merge_files.h"
+#include "tools/qntrace/traces/file_pool.h"
 
 namespace qn::test
 {

@@ -2,9 +2,9 @@
 
 #include <fmt/format.h>
 
-#include "tools/qntrace/dump_json.h"
-#include "tools/qntrace/dump_text.h"
-#include "tools/qntrace/record_names.h"
+#include "tools/qntrace/format/json.h"
+#include "tools/qntrace/format/record_names.h"
+#include "tools/qntrace/format/text.h"
 
 namespace qn::test
 {

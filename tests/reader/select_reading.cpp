@@ -1,6 +1,6 @@
 #include "reader/select_reading.h"
 
-#include "tools/qntrace/where.h"
+#include "tools/qntrace/select/where.h"
 
 namespace qn::test
 {

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "reader/trace_builder.h"
-#include "tools/qntrace/select.h"
+#include "tools/qntrace/select/selection.h"
 
 namespace qn::test
 {

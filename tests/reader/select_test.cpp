@@ -7,7 +7,7 @@
 
 #include "reader/every_kind.h"
 #include "reader/select_reading.h"
-#include "tools/qntrace/select_last.h"
+#include "tools/qntrace/select/last.h"
 
 namespace qn::test
 {

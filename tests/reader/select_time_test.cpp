@@ -6,8 +6,8 @@
 #include <stdexcept>
 #include <string>
 
-#include "tools/qntrace/select_time.h"
-#include "tools/qntrace/timestamps.h"
+#include "tools/qntrace/format/timestamps.h"
+#include "tools/qntrace/select/time.h"
 
 namespace qn::test
 {

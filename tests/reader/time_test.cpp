@@ -6,7 +6,7 @@
 
 #include "reader/reading.h"
 #include "reader/trace_builder.h"
-#include "tools/qntrace/timestamps.h"
+#include "tools/qntrace/format/timestamps.h"
 
 namespace qn::test
 {

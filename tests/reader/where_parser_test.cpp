@@ -4,7 +4,7 @@
 #include <string>
 
 #include "reader/select_reading.h"
-#include "tools/qntrace/where_error.h"
+#include "tools/qntrace/select/where_error.h"
 
 namespace qn::test
 {

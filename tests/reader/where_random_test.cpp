@@ -10,7 +10,7 @@
 #include <vector>
 
 #include "reader/select_reading.h"
-#include "tools/qntrace/where_error.h"
+#include "tools/qntrace/select/where_error.h"
 
 namespace qn::test
 {

@@ -18,9 +18,9 @@
 #include <qn_tr.h>
 
 #include "tools/qntrace/commands.h"
-#include "tools/qntrace/escape.h"
-#include "tools/qntrace/findings.h"
-#include "tools/qntrace/output.h"
+#include "tools/qntrace/console/findings.h"
+#include "tools/qntrace/console/output.h"
+#include "tools/qntrace/format/escape.h"
 #include "trace/files/compiled_pattern.h"
 #include "trace/spooling/spool_shape.h"
 #include "trace/traceutils/traceutils.h"

@@ -12,14 +12,14 @@
 #include <fmt/format.h>
 
 #include "tools/qntrace/commands.h"
-#include "tools/qntrace/dump_json.h"
-#include "tools/qntrace/dump_text.h"
-#include "tools/qntrace/findings.h"
-#include "tools/qntrace/output.h"
+#include "tools/qntrace/console/findings.h"
+#include "tools/qntrace/console/output.h"
+#include "tools/qntrace/format/json.h"
+#include "tools/qntrace/format/text.h"
 #include "tools/qntrace/reader/reader.h"
-#include "tools/qntrace/select.h"
-#include "tools/qntrace/select_last.h"
-#include "tools/qntrace/select_number.h"
+#include "tools/qntrace/select/last.h"
+#include "tools/qntrace/select/number.h"
+#include "tools/qntrace/select/selection.h"
 
 namespace qn::dump
 {

@@ -14,12 +14,12 @@
 #include <qn_tr.h>
 
 #include "tools/qntrace/commands.h"
-#include "tools/qntrace/escape.h"
-#include "tools/qntrace/findings.h"
-#include "tools/qntrace/output.h"
+#include "tools/qntrace/console/findings.h"
+#include "tools/qntrace/console/output.h"
+#include "tools/qntrace/format/escape.h"
+#include "tools/qntrace/format/record_names.h"
+#include "tools/qntrace/format/timestamps.h"
 #include "tools/qntrace/reader/reader.h"
-#include "tools/qntrace/record_names.h"
-#include "tools/qntrace/timestamps.h"
 
 namespace qn::dump
 {

@@ -10,7 +10,7 @@
 #include <fmt/format.h>
 
 #include "tools/qntrace/commands.h"
-#include "tools/qntrace/output.h"
+#include "tools/qntrace/console/output.h"
 
 namespace
 {

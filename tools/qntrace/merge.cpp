@@ -10,15 +10,15 @@
 #include <fmt/format.h>
 
 #include "tools/qntrace/commands.h"
-#include "tools/qntrace/dump_json.h"
-#include "tools/qntrace/dump_text.h"
-#include "tools/qntrace/durations.h"
-#include "tools/qntrace/escape.h"
-#include "tools/qntrace/merge_progress.h"
-#include "tools/qntrace/merge_streams.h"
-#include "tools/qntrace/output.h"
-#include "tools/qntrace/select.h"
-#include "tools/qntrace/trace_set.h"
+#include "tools/qntrace/console/output.h"
+#include "tools/qntrace/console/progress.h"
+#include "tools/qntrace/format/durations.h"
+#include "tools/qntrace/format/escape.h"
+#include "tools/qntrace/format/json.h"
+#include "tools/qntrace/format/text.h"
+#include "tools/qntrace/select/selection.h"
+#include "tools/qntrace/traces/merged_traces.h"
+#include "tools/qntrace/traces/trace_set.h"
 
 namespace qn::dump
 {

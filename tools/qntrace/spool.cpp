@@ -11,11 +11,11 @@
 #include <qn_tr.h>
 
 #include "tools/qntrace/commands.h"
-#include "tools/qntrace/findings.h"
-#include "tools/qntrace/output.h"
+#include "tools/qntrace/console/findings.h"
+#include "tools/qntrace/console/output.h"
 #include "tools/qntrace/reader/reader.h"
-#include "tools/qntrace/spool_table.h"
-#include "tools/qntrace/spool_tree.h"
+#include "tools/qntrace/spool/table.h"
+#include "tools/qntrace/spool/tree.h"
 
 namespace qn::dump
 {

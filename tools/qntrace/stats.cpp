@@ -9,14 +9,14 @@
 #include <fmt/format.h>
 
 #include "tools/qntrace/commands.h"
-#include "tools/qntrace/durations.h"
-#include "tools/qntrace/findings.h"
-#include "tools/qntrace/output.h"
+#include "tools/qntrace/console/findings.h"
+#include "tools/qntrace/console/output.h"
+#include "tools/qntrace/format/durations.h"
 #include "tools/qntrace/reader/reader.h"
-#include "tools/qntrace/select.h"
-#include "tools/qntrace/stats_report.h"
-#include "tools/qntrace/stats_tally.h"
-#include "tools/qntrace/trace_set.h"
+#include "tools/qntrace/select/selection.h"
+#include "tools/qntrace/stats/report.h"
+#include "tools/qntrace/stats/tally.h"
+#include "tools/qntrace/traces/trace_set.h"
 
 namespace qn::dump
 {

@@ -5,7 +5,7 @@ install(FILES include/qn.h include/qn_cu.h include/qn_ffdc.h include/cu_tr_proxy
         DESTINATION ${CMAKE_INSTALL_INCLUDEDIR})
 install(TARGETS qn_tr qn_cu qn_ffdc EXPORT qn_tr_targets LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR})
 install(TARGETS qntrace RUNTIME DESTINATION ${CMAKE_INSTALL_BINDIR})
-install(FILES tools/qntrace/qntrace.1 DESTINATION ${CMAKE_INSTALL_MANDIR}/man1)
+install(DIRECTORY tools/qntrace/man/ DESTINATION ${CMAKE_INSTALL_MANDIR}/man1)
 install(FILES docs/trace.conf.5 DESTINATION ${CMAKE_INSTALL_MANDIR}/man5)
 install(FILES docs/trace.conf.sample DESTINATION ${CMAKE_INSTALL_DOCDIR}/examples)
 

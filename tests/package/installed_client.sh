@@ -47,6 +47,8 @@ for client in client_c client_cxx project/build/client readme; do
     rm "$scratch/trace"
 done
 test -s "$prefix/share/man/man1/qntrace.1"
+test -s "$prefix/share/man/man1/qntrace-dump.1"
+test -s "$prefix/share/bash-completion/completions/qntrace"
 test -s "$prefix/share/man/man5/trace.conf.5"
 "$prefix/bin/qntrace" config "$prefix/share/doc/qn_tr/examples/trace.conf.sample" >/dev/null
 test -s "$prefix/share/locale/C/LC_MESSAGES/qn_tr.cat"

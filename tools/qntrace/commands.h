@@ -7,6 +7,7 @@
 namespace qn::dump
 {
 
+void add_completion_command(CLI::App &app, int &status);
 void add_config_command(CLI::App &app, int &status);
 void add_dump_command(CLI::App &app, int &status);
 void add_info_command(CLI::App &app, int &status);

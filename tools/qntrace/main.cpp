@@ -29,6 +29,7 @@ int run(int argc, char **argv)
     qn::dump::add_stats_command(app, status);
     qn::dump::add_spool_command(app, status);
     qn::dump::add_config_command(app, status);
+    qn::dump::add_completion_command(app, status);
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError &error) {

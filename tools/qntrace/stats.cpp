@@ -31,7 +31,6 @@ struct stats_options {
     std::string bucket; // as given; empty: not
     std::vector<std::string> files;
     std::shared_ptr<const selection> selected;
-    std::function<bool()> selects; // whether any records are left out
 };
 
 bool carries_data(const reader::raw_record &record)
@@ -70,10 +69,10 @@ int count_file(const std::string &path, const stats_options &options, stats_tall
         reader::trace_reader trace(source, std::ref(findings));
         if (trace.header()) {
             loss_counter lost(*trace.header());
-            if (options.selects())
-                count_selected({path, *trace.header()}, trace, *options.selected, tally, lost);
-            else
+            if (options.selected->admits_all())
                 count_all(trace, tally, lost);
+            else
+                count_selected({path, *trace.header()}, trace, *options.selected, tally, lost);
             tally.lost.add(lost.so_far());
             ++tally.files;
         }
@@ -126,15 +125,7 @@ void add_stats_command(CLI::App &app, int &status)
         ->add_option("--top", options->format.top,
                      fmt::format("How many components, ids and threads to show, {} unless given; 0: all", usual_top))
         ->type_name("N");
-    const auto before_selection = command->get_options().size();
     options->selected = add_selection_options(*command);
-    const auto all = command->get_options();
-    const std::vector<const CLI::Option *> selecting(all.begin() + static_cast<std::ptrdiff_t>(before_selection),
-                                                     all.end());
-    options->selects = [selecting] {
-        return std::any_of(selecting.begin(), selecting.end(),
-                           [](const CLI::Option *option) { return option->count() > 0; });
-    };
     command
         ->add_option("FILE", options->files,
                      "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"

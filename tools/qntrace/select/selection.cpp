@@ -73,6 +73,12 @@ void selection::set_grep(const std::string &expression) { grep_.emplace(expressi
 void selection::set_where(std::string_view expression, const timespec &now) { where_.emplace(expression, now); }
 
 // What costs least is asked first.
+bool selection::admits_all() const
+{
+    return components_.empty() && kinds_.none() && threads_.empty() && ids_.empty() && !since_ && !until_ && !grep_ &&
+           !where_;
+}
+
 bool selection::admits(const trace_origin &origin, const reader::trace_record &record) const
 {
     if (!admits_header(record) || !admits_id(record.body) || !admits_time(record.time)) return false;

@@ -26,6 +26,8 @@ class selection
 {
 public:
     bool admits(const trace_origin &origin, const reader::trace_record &record) const;
+    // Whether it was told nothing, so that records need not be decoded to be admitted.
+    bool admits_all() const;
 
     // All throw std::invalid_argument for text that is not what they take; what() says what was expected.
     void add_component(std::string_view name);

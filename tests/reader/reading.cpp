@@ -13,11 +13,11 @@ namespace
 
 constexpr std::string_view file_name = "test.trc";
 
-std::vector<std::string> of_level(const std::vector<reader::finding> &findings, reader::finding::severity level)
+std::vector<std::string> texts(const std::vector<reader::finding> &findings, bool notes)
 {
     std::vector<std::string> result;
     for (const auto &found : findings) {
-        if (found.level != level) continue;
+        if ((found.level == reader::finding::severity::note) != notes) continue;
         result.push_back(found.offset ? fmt::format("{}: {}", *found.offset, found.text) : found.text);
     }
     return result;
@@ -51,8 +51,8 @@ std::vector<std::uint32_t> reading::data_seqs() const
     return result;
 }
 
-std::vector<std::string> reading::damage() const { return of_level(findings, reader::finding::severity::damage); }
-std::vector<std::string> reading::notes() const { return of_level(findings, reader::finding::severity::note); }
+std::vector<std::string> reading::damage() const { return texts(findings, false); }
+std::vector<std::string> reading::notes() const { return texts(findings, true); }
 
 reading read_all(reader::byte_source &source)
 {

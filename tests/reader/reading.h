@@ -28,7 +28,7 @@ struct reading {
 
     // Sequence numbers of the records that carry data.
     std::vector<std::uint32_t> data_seqs() const;
-    // "OFFSET: TEXT" of each finding that is damage.
+    // "OFFSET: TEXT" of each finding that is damage, or a record that was not completed.
     std::vector<std::string> damage() const;
     std::vector<std::string> notes() const;
 };

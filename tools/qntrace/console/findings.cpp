@@ -21,7 +21,7 @@ std::string printable_name(const std::string &path)
 
 void finding_printer::operator()(const reader::finding &found)
 {
-    if (found.level == reader::finding::severity::damage) damaged_ = true;
+    if (found.level != reader::finding::severity::note) faulty_ = true;
     if (++count_ > most_shown) return;
     const auto where = found.offset ? fmt::format("offset {}: ", *found.offset) : std::string();
     write_message(fmt::format("{}: {}{}", name_, where, found.text));
@@ -34,6 +34,6 @@ void finding_printer::finish() const
     }
 }
 
-int finding_printer::status() const { return damaged_ ? status_damaged : status_sound; }
+int finding_printer::status() const { return faulty_ ? status_damaged : status_sound; }
 
 } // namespace qn::dump

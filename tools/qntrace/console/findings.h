@@ -26,7 +26,7 @@ public:
 private:
     std::string name_;
     std::uint64_t count_ = 0;
-    bool damaged_ = false;
+    bool faulty_ = false; // damaged, or with a record that was not completed
 };
 
 } // namespace qn::dump

@@ -12,6 +12,7 @@ namespace qn::reader
 struct finding {
     enum class severity {
         note,   // worth telling, and no fault of the file
+        loss,   // a record was not completed: its writer is at work, or died; the file is as it should be
         damage, // the file is truncated, torn or corrupt; what was sound is still delivered
     };
 

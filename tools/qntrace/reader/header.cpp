@@ -102,7 +102,8 @@ file_header parse_in_its_order(std::span<const std::byte> bytes, const finding_s
 void set_ring_begin(file_header &header, const finding_sink &report)
 {
     header.ring.begin = header.ring_offset;
-    if (offset_plausible(header)) return;
+    const bool fixed = header.version == format::format_version;
+    if (fixed ? header.ring_offset == format::header_bytes : offset_plausible(header)) return;
     header.ring.begin = format::header_bytes;
     report({finding::severity::damage, offsetof(trace_file_header_t, uOffset),
             fmt::format("the header gives {} as the offset of the first record; {} is used", header.ring_offset,

@@ -64,11 +64,19 @@ std::optional<undecoded_record> trace_reader::next_undecoded()
     return undecoded_record{*raw, time_of(raw->header)};
 }
 
+std::uint64_t trace_reader::unreadable_bytes() const
+{
+    if (!header_) return 0;
+    const std::uint64_t cut_off = header_->file_size > header_->ring.end ? header_->file_size - header_->ring.end : 0;
+    return cut_off + walk_->unreadable_bytes();
+}
+
 decoded_record trace_reader::decode_and_report(const raw_record &raw)
 {
     auto decoded = decode(raw);
     if (!decoded.problem.empty()) {
-        report_({finding::severity::damage, raw.offset,
+        const bool unfinished = std::holds_alternative<unfinished_body>(decoded.body);
+        report_({unfinished ? finding::severity::loss : finding::severity::damage, raw.offset,
                  fmt::format("{} (sequence number {})", decoded.problem, raw.header.seq)});
     }
     time_base_->pass(decoded.body);

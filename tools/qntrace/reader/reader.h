@@ -48,6 +48,9 @@ public:
     // is wrong with the record as a whole.
     std::optional<undecoded_record> next_undecoded();
 
+    // Bytes of the ring, as far as the header tells its size, that the records so far do not cover because of damage.
+    std::uint64_t unreadable_bytes() const;
+
 private:
     decoded_record decode_and_report(const raw_record &raw);
     std::optional<timespec> time_of(const record_header &header) const;

@@ -29,6 +29,12 @@ record_header parse_record_header(const byte_view &view)
     return header;
 }
 
+// Whether the record has a number of its own; a filler has one when it closed off the end of the ring.
+bool is_numbered(const record_header &header)
+{
+    return header.function != free_function || (header.seq != format::seq_filler && header.seq != 0);
+}
+
 bool has_body(const record_header &header)
 {
     return header.function != free_function && header.function != unfinished_function;
@@ -69,6 +75,7 @@ std::optional<raw_record> ring_walk::next()
         // Overtaken by the writer: what follows is older than what was handed out, unless the walk catches up.
         if (goes_back(record->header) && catch_up()) continue;
         advance(offset, header.length);
+        if (record->oversized) unreadable_bytes_ += header.length;
         if (already_delivered(record->header)) continue;
         check_order(offset, record->header);
         return record;
@@ -144,10 +151,12 @@ void ring_walk::derail(std::uint64_t offset, const std::string &problem)
     if (last_damage_ != offset) report_({finding::severity::damage, offset, problem});
     last_damage_ = offset;
     if (leg_ == leg::second) {
+        unreadable_bytes_ += stop_ - offset;
         leg_ = leg::done;
     } else if (tiles_ == 0 && !surveyed_) {
         start_without_oldest();
     } else {
+        unreadable_bytes_ += header_.ring.end - offset;
         leg_ = leg::second;
         at_ = header_.ring.begin;
         if (at_ >= stop_) leg_ = leg::done;
@@ -167,6 +176,7 @@ bool ring_walk::catch_up()
     leg_ = leg::first;
     at_ = stop_ = *oldest;
     tiles_ = 0;
+    unreadable_bytes_ = 0;
     delivered_through_ = last_seq_;
     return true;
 }
@@ -210,13 +220,15 @@ bool ring_walk::already_delivered(const record_header &header)
 
 bool ring_walk::goes_back(const record_header &header) const
 {
-    const bool counted = header.function != free_function && header.seq % 2 == 0;
+    const bool counted = is_numbered(header) && header.seq % 2 == 0;
     return counted && !delivered_through_ && last_seq_ && !later(header.seq, *last_seq_);
 }
 
 void ring_walk::check_order(std::uint64_t offset, const record_header &header)
 {
-    if (header.function == free_function) return;
+    if (!is_numbered(header)) return;
+    // A writer that died while it took the oldest record's space has left its own number there, the newest of all.
+    if (tiles_ == 1 && header.function == unfinished_function) return;
     if (header.seq % 2 != 0) {
         report_({finding::severity::damage, offset,
                  fmt::format("sequence number {} is odd, which no record's is", header.seq)});

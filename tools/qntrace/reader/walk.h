@@ -52,6 +52,8 @@ public:
 
     // The next record, fillers and unfinished ones included; its bytes are valid until the next call.
     std::optional<raw_record> next();
+    // Bytes that the walk has passed over because of damage.
+    std::uint64_t unreadable_bytes() const { return unreadable_bytes_; }
 
 private:
     enum class leg { first, second, done };
@@ -81,6 +83,7 @@ private:
     std::uint64_t at_ = 0;
     std::uint64_t stop_ = 0;  // the second leg ends here: at the oldest record, or at the end when that is unknown
     std::uint64_t tiles_ = 0; // stepped over since the walk was last started
+    std::uint64_t unreadable_bytes_ = 0;
     bool surveyed_ = false;
     std::optional<std::uint64_t> last_damage_; // not told twice when both legs end there
 

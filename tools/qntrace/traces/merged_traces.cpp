@@ -30,15 +30,6 @@ std::size_t window_for(std::size_t sources)
 
 auto key(const timespec &time) { return std::tuple(time.tv_sec, time.tv_nsec); }
 
-// How much earlier `time` is than `last`; 0 when it is not. Steps of more than 292 years count as those.
-std::int64_t step_back(const timespec &last, const timespec &time)
-{
-    if (!(key(time) < key(last))) return 0;
-    __extension__ using int128 = __int128;
-    const int128 step = (int128{last.tv_sec} - time.tv_sec) * 1'000'000'000 + (int128{last.tv_nsec} - time.tv_nsec);
-    return static_cast<std::int64_t>(std::min(step, int128{std::numeric_limits<std::int64_t>::max()}));
-}
-
 } // namespace
 
 merge_stream::merge_stream(const trace_source &source, const merge_settings &settings, file_pool &pool,
@@ -73,24 +64,15 @@ void merge_stream::follow_clock()
 {
     if (!record_->time) return;
     record_->time = later_by(*record_->time, offset_ns_);
-    if (last_time_) {
-        const std::int64_t step = step_back(*last_time_, *record_->time);
-        if (step != 0) ++steps_back_;
-        longest_step_ns_ = std::max(longest_step_ns_, step);
-    }
-    last_time_ = place_ = *record_->time;
+    clock_.pass(*record_->time);
+    place_ = *record_->time;
 }
 
 void merge_stream::finish() const
 {
     findings_.finish();
     const auto name = printable_name(source_.path);
-    if (steps_back_ == 1) {
-        write_message(fmt::format("{}: the clock steps back by {}", name, duration_text(longest_step_ns_)));
-    } else if (steps_back_ > 1) {
-        write_message(fmt::format("{}: the clock steps back {} times, by up to {}", name, steps_back_,
-                                  duration_text(longest_step_ns_)));
-    }
+    if (clock_.any()) write_message(fmt::format("{}: {}", name, clock_.text()));
     if (losses_ && losses_->so_far().any())
         write_message(fmt::format("{}: lost: {}", name, losses_text(losses_->so_far(), settings_.utc)));
 }

@@ -16,6 +16,7 @@
 
 #include "tools/qntrace/console/findings.h"
 #include "tools/qntrace/reader/reader.h"
+#include "tools/qntrace/traces/clock_steps.h"
 #include "tools/qntrace/traces/file_pool.h"
 #include "tools/qntrace/traces/losses.h"
 #include "tools/qntrace/traces/trace_set.h"
@@ -64,9 +65,7 @@ private:
     std::optional<reader::trace_record> record_;
     timespec place_;
     std::uint64_t bytes_passed_ = 0;
-    std::optional<timespec> last_time_;
-    std::uint64_t steps_back_ = 0;
-    std::int64_t longest_step_ns_ = 0;
+    clock_steps clock_;
 };
 
 class merged_traces

@@ -1,19 +1,16 @@
 // qntrace dump: prints trace files, or the records of them that are asked for.
 #include <algorithm>
-#include <cstdlib>
 #include <memory>
 #include <optional>
 #include <string>
-#include <string_view>
 #include <vector>
-
-#include <unistd.h>
 
 #include <fmt/format.h>
 
 #include "tools/qntrace/commands.h"
 #include "tools/qntrace/console/findings.h"
 #include "tools/qntrace/console/output.h"
+#include "tools/qntrace/console/pager.h"
 #include "tools/qntrace/format/json.h"
 #include "tools/qntrace/format/text.h"
 #include "tools/qntrace/reader/reader.h"
@@ -30,30 +27,13 @@ struct dump_options {
     bool json = false;
     bool raw = false;
     bool utc = false;
+    bool no_pager = false;
     std::string color = "auto";
+    bool colored = false; // what follows from it
     std::optional<std::size_t> last;
     std::shared_ptr<const selection> selected;
     std::vector<std::string> files;
 };
-
-bool is_set(const char *variable)
-{
-    const char *value = std::getenv(variable);
-    return value != nullptr && *value != '\0';
-}
-
-bool is_dumb_terminal()
-{
-    const char *terminal = std::getenv("TERM");
-    return terminal != nullptr && std::string_view(terminal) == "dumb";
-}
-
-// What is not asked for by the option, only a terminal gets, and nobody who has said that he wants none.
-bool wants_color(const std::string &choice)
-{
-    if (choice != "auto") return choice == "always";
-    return !is_set("NO_COLOR") && !is_dumb_terminal() && isatty(STDOUT_FILENO) != 0;
-}
 
 // Prints one file; `Format` is text_dump or json_dump.
 template <typename Format>
@@ -94,7 +74,7 @@ int dump_file(const std::string &path, const dump_options &options, bool first)
             dump_records(path, trace, format, options);
         } else {
             if (!first && trace.header()) write_data("\n");
-            text_dump format({options.raw, options.utc, locale_charset(), wants_color(options.color)});
+            text_dump format({options.raw, options.utc, locale_charset(), options.colored});
             dump_records(path, trace, format, options);
         }
     } catch (const reader::io_error &error) {
@@ -140,10 +120,15 @@ void add_dump_command(CLI::App &app, int &status)
     command->add_option("--color", options->color, "Whether the text is coloured; auto: on a terminal")
         ->type_name("WHEN")
         ->check(CLI::IsMember({"auto", "always", "never"}));
+    command->add_flag("--no-pager", options->no_pager, no_pager_help);
     options->selected = add_selection_options(*command);
     add_last_option(*command, options->last);
     command->add_option("FILE", options->files, "Trace files: live ones, pages, or copies")->required();
-    command->callback([options, &status] { status = dump_files(*options); });
+    command->callback([options, &status] {
+        options->colored = wants_color(options->color.c_str());
+        const pager screen(!options->json && !options->no_pager);
+        status = dump_files(*options);
+    });
 }
 
 } // namespace qn::dump

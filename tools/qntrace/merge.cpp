@@ -11,6 +11,7 @@
 
 #include "tools/qntrace/commands.h"
 #include "tools/qntrace/console/output.h"
+#include "tools/qntrace/console/pager.h"
 #include "tools/qntrace/console/progress.h"
 #include "tools/qntrace/format/durations.h"
 #include "tools/qntrace/format/escape.h"
@@ -28,6 +29,7 @@ namespace
 struct merge_options {
     bool json = false;
     bool utc = false;
+    bool no_pager = false;
     std::vector<std::string> offsets;
     std::vector<std::string> files;
     std::shared_ptr<const selection> selected;
@@ -204,13 +206,17 @@ void add_merge_command(CLI::App &app, int &status)
                      "the node is named by its host or its 16-digit identifier")
         ->expected(1)
         ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
+    command->add_flag("--no-pager", options->no_pager, no_pager_help);
     options->selected = add_selection_options(*command);
     command
         ->add_option("FILE", options->files,
                      "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"
                      "copies below them and the trace files in them")
         ->required();
-    command->callback([options, &status] { status = merge(*options); });
+    command->callback([options, &status] {
+        const pager screen(!options->json && !options->no_pager);
+        status = merge(*options);
+    });
 }
 
 } // namespace qn::dump

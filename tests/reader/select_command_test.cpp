@@ -1,21 +1,17 @@
 // qntrace dump with a selection: on the golden trace, on a trace that the library has just written, and its colours.
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <ctime>
-#include <optional>
 #include <sstream>
 #include <string>
 #include <vector>
-
-#include <fcntl.h>
-#include <unistd.h>
 
 #include <nlohmann/json.hpp>
 
 #include "reader/every_kind.h"
 #include "reader/program.h"
 #include "reader/reading.h"
+#include "reader/terminal.h"
 
 namespace qn::test
 {
@@ -260,43 +256,22 @@ TEST(DumpColor, IsWantedWhenAskedForWhateverTheEnvironmentSays)
     EXPECT_FALSE(is_colored(dump({"--color", "never"}, golden_trace).out));
 }
 
-// What a terminal gets from `qntrace dump`; nothing when there are no terminals here.
-std::optional<std::string> on_a_terminal(const strings &options, const strings &environment)
+bool is_colored_on_a_terminal(strings options, strings environment)
 {
-    const scratch_folder folder;
-    trace_builder file;
-    file.add_id(1);
-    file.close();
-    const auto path = folder.file("a.trc", file.bytes());
-    const int terminal = posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
-    if (terminal < 0) return std::nullopt;
-    if (grantpt(terminal) != 0 || unlockpt(terminal) != 0) {
-        close(terminal);
-        return std::nullopt;
-    }
-    const std::string name = ptsname(terminal);
-    const int kept_open =
-        open(name.c_str(), O_RDWR | O_NOCTTY | O_CLOEXEC); // or what is written is lost with its writer
-    const auto run = dump(options, path, {.environment = environment, .out_file = name});
-    EXPECT_EQ(run.status, 0) << run.err;
-    std::string out(1 << 14, '\0');
-    const auto count = read(terminal, out.data(), out.size());
-    close(kept_open);
-    close(terminal);
-    out.resize(count < 0 ? 0 : static_cast<std::size_t>(count));
-    return out;
+    options.insert(options.begin(), "dump");
+    options.push_back(golden_trace);
+    environment.emplace_back("QNTRACE_PAGER=");
+    return is_colored(run_on_terminal(options, environment).screen);
 }
 
 TEST(DumpColor, IsForATerminalUnlessTheEnvironmentSaysNo)
 {
-    const auto usual = on_a_terminal({}, {"TERM=xterm"});
-    if (!usual) GTEST_SKIP() << "there are no terminals here";
-    EXPECT_TRUE(is_colored(*usual));
-    EXPECT_TRUE(is_colored(*on_a_terminal({}, {"TERM=xterm", "NO_COLOR="})));
-    EXPECT_FALSE(is_colored(*on_a_terminal({}, {"TERM=xterm", "NO_COLOR=1"})));
-    EXPECT_FALSE(is_colored(*on_a_terminal({}, {"TERM=dumb"})));
-    EXPECT_FALSE(is_colored(*on_a_terminal({"--color", "never"}, {"TERM=xterm"})));
-    EXPECT_TRUE(is_colored(*on_a_terminal({"--color", "always"}, {"TERM=dumb"})));
+    EXPECT_TRUE(is_colored_on_a_terminal({}, {"TERM=xterm"}));
+    EXPECT_TRUE(is_colored_on_a_terminal({}, {"TERM=xterm", "NO_COLOR="}));
+    EXPECT_FALSE(is_colored_on_a_terminal({}, {"TERM=xterm", "NO_COLOR=1"}));
+    EXPECT_FALSE(is_colored_on_a_terminal({}, {"TERM=dumb"}));
+    EXPECT_FALSE(is_colored_on_a_terminal({"--color", "never"}, {"TERM=xterm"}));
+    EXPECT_TRUE(is_colored_on_a_terminal({"--color", "always"}, {"TERM=dumb"}));
 }
 
 } // namespace

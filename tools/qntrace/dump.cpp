@@ -11,6 +11,7 @@
 #include "tools/qntrace/console/findings.h"
 #include "tools/qntrace/console/output.h"
 #include "tools/qntrace/console/pager.h"
+#include "tools/qntrace/console/terminal.h"
 #include "tools/qntrace/format/json.h"
 #include "tools/qntrace/format/text.h"
 #include "tools/qntrace/reader/reader.h"
@@ -125,7 +126,7 @@ void add_dump_command(CLI::App &app, int &status)
     add_last_option(*command, options->last);
     command->add_option("FILE", options->files, "Trace files: live ones, pages, or copies")->required();
     command->callback([options, &status] {
-        options->colored = wants_color(options->color.c_str());
+        options->colored = wants_color(options->color);
         const pager screen(!options->json && !options->no_pager);
         status = dump_files(*options);
     });

@@ -24,6 +24,7 @@ int run(int argc, char **argv)
     app.footer("Exit status: 0 all sound, 1 some file is damaged or faulty (what is sound is shown),\n"
                "2 wrong usage, 3 a file cannot be read.");
     qn::dump::add_dump_command(app, status);
+    qn::dump::add_errors_command(app, status);
     qn::dump::add_info_command(app, status);
     qn::dump::add_merge_command(app, status);
     qn::dump::add_stats_command(app, status);
@@ -46,6 +47,7 @@ int main(int argc, char **argv)
     // A reader that has seen enough (head, a pager) ends this program quietly, whatever its parent ignores.
     std::signal(SIGPIPE, SIG_DFL);
     std::setlocale(LC_CTYPE, "");
+    std::setlocale(LC_MESSAGES, ""); // whose message catalogues are taken
     try {
         return run(argc, argv);
     } catch (const std::exception &error) {

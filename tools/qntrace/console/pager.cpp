@@ -12,22 +12,12 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include "tools/qntrace/console/terminal.h"
+
 namespace qn::dump
 {
 namespace
 {
-
-bool is_set(const char *variable)
-{
-    const char *value = std::getenv(variable);
-    return value != nullptr && *value != '\0';
-}
-
-bool is_dumb_terminal()
-{
-    const char *terminal = std::getenv("TERM");
-    return terminal != nullptr && std::string_view(terminal) == "dumb";
-}
 
 bool is_program(std::string_view name)
 {
@@ -68,12 +58,6 @@ pid_t start(const std::string &command, const int (&ends)[2])
 }
 
 } // namespace
-
-bool wants_color(const char *choice)
-{
-    if (std::string_view(choice) != "auto") return std::string_view(choice) == "always";
-    return !is_set("NO_COLOR") && !is_dumb_terminal() && isatty(STDOUT_FILENO) != 0;
-}
 
 pager::pager(bool wanted)
 {

@@ -11,10 +11,6 @@
 namespace qn::dump
 {
 
-// Whether the user wants the output in colour: what is not asked for by `choice` (auto, always, never), only a terminal
-// gets, and nobody who has said that he wants none. Ask before a pager stands there in the terminal's place.
-bool wants_color(const char *choice);
-
 inline constexpr const char *no_pager_help = "Do not show the text on a terminal by a pager";
 
 class pager

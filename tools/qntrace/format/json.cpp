@@ -3,7 +3,7 @@
 #include <fmt/format.h>
 #include <nlohmann/json.hpp>
 
-#include "tools/qntrace/format/escape.h"
+#include "tools/qntrace/format/json_text.h"
 #include "tools/qntrace/format/record_names.h"
 #include "tools/qntrace/reader/message.h"
 
@@ -27,60 +27,6 @@ std::string hexadecimal(std::span<const std::byte> bytes)
         result += hex_digits[value & 15];
     }
     return result;
-}
-
-// Turns the texts of one object into JSON's, and knows whether all of them were UTF-8.
-class text_encoder
-{
-public:
-    explicit text_encoder(bool latin_1) : latin_1_(latin_1) {}
-
-    bool all_fit() const { return all_fit_; }
-
-    json text(std::string_view bytes)
-    {
-        if (!latin_1_) {
-            if (is_utf_8(bytes)) return std::string(bytes);
-            all_fit_ = false;
-            return nullptr;
-        }
-        std::string result;
-        for (const char c : bytes) {
-            const auto byte = static_cast<unsigned char>(c);
-            if (byte < 0x80) {
-                result += c;
-            } else {
-                result += static_cast<char>(0xC0 | byte >> 6);
-                result += static_cast<char>(0x80 | (byte & 0x3F));
-            }
-        }
-        return result;
-    }
-
-    template <typename Text>
-    json text_or_null(const std::optional<Text> &bytes)
-    {
-        return bytes ? text(*bytes) : json(nullptr);
-    }
-
-private:
-    bool latin_1_;
-    bool all_fit_ = true;
-};
-
-// Makes an object with its texts in UTF-8 or, when one of them is not, all of them byte by byte.
-template <typename Make>
-void append_object(std::string &out, Make make)
-{
-    text_encoder utf_8(false);
-    json object = make(utf_8);
-    if (!utf_8.all_fit()) {
-        text_encoder latin_1(true);
-        object = make(latin_1);
-        object["encoding"] = "latin-1";
-    }
-    out += object.dump(-1, ' ', true);
-    out += '\n';
 }
 
 json time_base_object(const cu_timeinfo_t &info)

@@ -227,33 +227,51 @@ std::optional<std::string> convert(const error_argument &argument, const convers
     }
 }
 
-} // namespace
+struct filled_message {
+    std::string text;
+    bool whole = true; // no conversion was left as it stands
+};
 
-std::string fill_in(std::string_view message, const std::vector<error_argument> &arguments)
+filled_message fill(std::string_view message, const std::vector<error_argument> &arguments)
 {
-    std::string result;
+    filled_message result;
     arguments_in_turn in_turn(arguments);
     while (!message.empty()) {
         const auto percent = std::min(message.find('%'), message.size());
-        result.append(message.substr(0, percent));
+        result.text.append(message.substr(0, percent));
         message.remove_prefix(percent);
         if (message.empty()) break;
         const auto how = read_conversion(message, in_turn);
         if (!how) {
-            result.append(message);
+            result.text.append(message);
+            result.whole = false;
             break;
         }
         const auto as_it_stands = message.substr(0, how->length);
         message.remove_prefix(how->length);
         if (how->type == '%') {
-            result += '%';
+            result.text += '%';
             continue;
         }
         const auto *argument = how->position ? in_turn.at(*how->position) : in_turn.next();
         const auto text = argument == nullptr ? std::nullopt : convert(*argument, *how);
-        result.append(text ? *text : as_it_stands);
+        result.text.append(text ? *text : as_it_stands);
+        result.whole = result.whole && text.has_value();
     }
     return result;
+}
+
+} // namespace
+
+std::string fill_in(std::string_view message, const std::vector<error_argument> &arguments)
+{
+    return fill(message, arguments).text;
+}
+
+std::optional<std::string> fill_in_whole(std::string_view message, const std::vector<error_argument> &arguments)
+{
+    filled_message filled = fill(message, arguments);
+    return filled.whole ? std::optional(std::move(filled.text)) : std::nullopt;
 }
 
 } // namespace qn::reader

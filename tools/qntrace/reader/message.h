@@ -4,6 +4,7 @@
 // not match its argument, or has none, stays in the text as it stands.
 #pragma once
 
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -14,5 +15,7 @@ namespace qn::reader
 {
 
 std::string fill_in(std::string_view message, const std::vector<error_argument> &arguments);
+// Nothing when a conversion would stay as it stands: then the message was not made for these arguments.
+std::optional<std::string> fill_in_whole(std::string_view message, const std::vector<error_argument> &arguments);
 
 } // namespace qn::reader

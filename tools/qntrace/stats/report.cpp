@@ -9,6 +9,7 @@
 #include "tools/qntrace/format/durations.h"
 #include "tools/qntrace/format/escape.h"
 #include "tools/qntrace/format/timestamps.h"
+#include "tools/qntrace/traces/losses_json.h"
 
 namespace qn::dump
 {
@@ -170,12 +171,8 @@ json totals(const stats_tally &tally, timestamps &times)
                    {"files", tally.files},
                    {"records", tally.all.records},
                    {"bytes", tally.all.bytes},
-                   {"without_time", tally.without_time},
-                   {"unfinished", tally.lost.unfinished},
-                   {"missing", tally.lost.missing},
-                   {"overwritten", tally.lost.overwritten},
-                   {"unspooled_pages", tally.lost.unspooled},
-                   {"last_reuse_time", tally.lost.last_reuse_time}};
+                   {"without_time", tally.without_time}};
+    object.update(losses_json(tally.lost));
     if (tally.first_ns) object["first"] = time_json(*tally.first_ns, times);
     if (tally.last_ns) object["last"] = time_json(*tally.last_ns, times);
     if (const auto span = span_of(tally)) object["records_per_second"] = rate(tally.all.records, *span);

@@ -159,6 +159,7 @@ void merged_traces::close(std::size_t index)
     settings_.before_message();
     const merge_stream &stream = *streams_.at(index);
     stream.finish();
+    if (settings_.after_file && stream.has_header()) settings_.after_file(index, stream.lost());
     status_ = std::max(status_, stream.status());
     // What was no record: the header, and free space. A live file may have passed more than it had.
     bytes_done_ += sources_[index].bytes - std::min(sources_[index].bytes, stream.bytes_passed());

@@ -29,6 +29,8 @@ struct merge_settings {
     std::function<std::int64_t(const trace_source &)> clock_offset;
     // Called before anything is written to standard error.
     std::function<void()> before_message;
+    // Called behind the last record of each trace file with what is missing from it; may be empty.
+    std::function<void(std::size_t source, const losses &)> after_file = {};
     bool utc = false; // times in messages
 };
 
@@ -43,6 +45,9 @@ public:
     bool advance();
     const reader::trace_record &record() const { return *record_; }
     const reader::file_header &header() const { return *trace_.header(); }
+    bool has_header() const { return trace_.header().has_value(); }
+    // What is missing up to the record.
+    const losses &lost() const { return losses_->so_far(); }
     // Where the record belongs: its time, or that of the record before when it has none.
     const timespec &place() const { return place_; }
     // Of the records so far.

@@ -20,7 +20,7 @@ if(QN_TR_SANITIZE)
         add_compile_options(--param=asan-stack=0)
     endif()
 elseif(CMAKE_BUILD_TYPE MATCHES "Rel")
-    add_compile_definitions(_FORTIFY_SOURCE=2)
+    add_compile_definitions(_FORTIFY_SOURCE=3)
 endif()
 
 # Exports exactly the names that a version script lists.

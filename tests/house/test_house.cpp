@@ -103,6 +103,20 @@ TEST(House, NoFileOfTheLibraryOutgrowsItsRoom)
         EXPECT_LE(lines_of(file).size(), most_lines) << file;
 }
 
+TEST(House, EveryFileIsOpenedSoThatAnExecutedProgramDoesNotGetIt)
+{
+    const std::regex opening(R"(\b(?:open|openat|openat2|creat|fopen|freopen|mkstemp|mkostemp|pipe|dup|socket)\()");
+    const std::regex closed_on_exec(R"(O_CLOEXEC|fopen\([^"]*"[a-z]*e[a-z]*")");
+    size_t openings = 0;
+    for (const fs::path &file : code_below({"trace", "platform"}))
+        for (const std::string &line : lines_of(file)) {
+            if (line.find("//") != std::string::npos || !std::regex_search(line, opening)) continue;
+            ++openings;
+            EXPECT_TRUE(std::regex_search(line, closed_on_exec)) << file << ": " << line;
+        }
+    EXPECT_GE(openings, 5U);
+}
+
 TEST(House, NothingIsMarkedAsUnfinished)
 {
     const std::regex marker("\\b(TO"

@@ -23,10 +23,12 @@ int run(int argc, char **argv)
     app.require_subcommand(1);
     app.footer("Exit status: 0 all sound, 1 some file is damaged or faulty (what is sound is shown),\n"
                "2 wrong usage, 3 a file cannot be read.");
+    qn::dump::add_check_command(app, status);
     qn::dump::add_dump_command(app, status);
     qn::dump::add_errors_command(app, status);
     qn::dump::add_info_command(app, status);
     qn::dump::add_merge_command(app, status);
+    qn::dump::add_salvage_command(app, status);
     qn::dump::add_stats_command(app, status);
     qn::dump::add_spool_command(app, status);
     qn::dump::add_config_command(app, status);

@@ -19,6 +19,7 @@ struct finding {
     severity level = severity::damage;
     std::optional<std::uint64_t> offset; // in the file; absent when it concerns the file as a whole
     std::string text;                    // a clause without its full stop; holds no bytes of the file
+    std::optional<std::uint32_t> seq;    // of the record that it concerns, as far as there is one
 };
 
 // Called as soon as something is found, that is before the next record is delivered.

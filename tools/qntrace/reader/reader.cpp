@@ -77,7 +77,7 @@ decoded_record trace_reader::decode_and_report(const raw_record &raw)
     if (!decoded.problem.empty()) {
         const bool unfinished = std::holds_alternative<unfinished_body>(decoded.body);
         report_({unfinished ? finding::severity::loss : finding::severity::damage, raw.offset,
-                 fmt::format("{} (sequence number {})", decoded.problem, raw.header.seq)});
+                 fmt::format("{} (sequence number {})", decoded.problem, raw.header.seq), raw.header.seq});
     }
     time_base_->pass(decoded.body);
     return decoded;

@@ -24,6 +24,8 @@ public:
     void pass(const record_body &body);
     // Nothing when the base in force is unusable.
     std::optional<timespec> time_of(std::uint64_t counter) const;
+    // The base in force.
+    const cu_timeinfo_t &info() const { return info_; }
 
 private:
     void use(const cu_timeinfo_t &info);

@@ -231,12 +231,12 @@ void ring_walk::check_order(std::uint64_t offset, const record_header &header)
     if (tiles_ == 1 && header.function == unfinished_function) return;
     if (header.seq % 2 != 0) {
         report_({finding::severity::damage, offset,
-                 fmt::format("sequence number {} is odd, which no record's is", header.seq)});
+                 fmt::format("sequence number {} is odd, which no record's is", header.seq), header.seq});
         return;
     }
     if (goes_back(header)) {
-        report_(
-            {finding::severity::damage, offset, fmt::format("sequence number {} follows {}", header.seq, *last_seq_)});
+        report_({finding::severity::damage, offset,
+                 fmt::format("sequence number {} follows {}", header.seq, *last_seq_), header.seq});
     }
     last_seq_ = header.seq;
 }

@@ -93,6 +93,8 @@ void take_cluster(trace_source &source, const std::vector<std::string> &folders)
 class collector
 {
 public:
+    explicit collector(duplicates choice) : choice_(choice) {}
+
     void add(const std::string &argument)
     {
         std::error_code error;
@@ -124,7 +126,8 @@ private:
             trace_source source = named_source(entry->path());
             if (source.copy) continue;
             try {
-                if (is_trace_file(source.path)) found.push_back(std::move(source));
+                const bool is_page = choice_ == duplicates::kept && source.page != 0;
+                if (is_page || is_trace_file(source.path)) found.push_back(std::move(source));
             } catch (const reader::io_error &failure) {
                 tell(source.path, failure.what());
             }
@@ -178,6 +181,7 @@ private:
         set_.status = status_io_error;
     }
 
+    duplicates choice_;
     trace_set set_;
 };
 
@@ -204,12 +208,12 @@ std::string trace_source::node() const
     return fmt::format("node{}", node_number);
 }
 
-trace_set find_traces(const std::vector<std::string> &arguments)
+trace_set find_traces(const std::vector<std::string> &arguments, duplicates choice)
 {
-    collector collect;
+    collector collect(choice);
     for (const auto &argument : arguments) collect.add(argument);
     trace_set set = collect.take();
-    drop_duplicates(set.sources);
+    if (choice == duplicates::dropped) drop_duplicates(set.sources);
     share_hosts(set.sources);
     return set;
 }

@@ -63,6 +63,10 @@ struct trace_set {
     int status = 0;                    // an exit status: what was named and is not there was told
 };
 
-trace_set find_traces(const std::vector<std::string> &arguments);
+// Whether a life of a ring that several files hold is in the set once, or with every one of them. Who wants every file
+// also gets the pages whose header is broken, by their names; in a folder they are passed over otherwise.
+enum class duplicates { dropped, kept };
+
+trace_set find_traces(const std::vector<std::string> &arguments, duplicates choice = duplicates::dropped);
 
 } // namespace qn::dump

@@ -8,11 +8,11 @@ namespace
 {
 
 // app tried to open a file in open_it(), app.c line 120; the message has all types of arguments.
-byte_string error_body()
+byte_string error_body(endian order)
 {
     constexpr std::string_view message = "Error %1$d opening \"%5$s\": %2$ld %3$lld %4$g";
     const std::uint32_t strings_at = 72 + 6 * 16;
-    byte_string body;
+    byte_string body(order);
     body.u32(31).u32(18).u32(120); // id, error, line
     body.u32(strings_at);          // "open_it", 8 bytes
     body.u32(strings_at + 8);      // "app.c", 6 bytes
@@ -36,9 +36,9 @@ byte_string error_body()
 
 } // namespace
 
-trace_builder every_kind()
+trace_builder every_kind(endian order)
 {
-    trace_builder file(4096);
+    trace_builder file(4096, order);
     file.component = "____";
     file.seq = static_cast<std::uint32_t>(-2);
     file.add(2, file.body().text("SPOOL: app.1.sp not spooled 2 consecutive times"));
@@ -58,7 +58,7 @@ trace_builder every_kind()
                     .u32(0x1B0A00FF));
     file.add(12, file.body().u32(22).u32(4).u32(3).u32(16).u32(0xFFFFFFFF).u32(0x12345678));
     file.add(13, file.body().u32(23).u32(3).u64(7).u64(static_cast<std::uint64_t>(-70000)).u64(1ULL << 63));
-    file.add(14, error_body());
+    file.add(14, error_body(order));
     file.component = "AB";
     file.add_strings(24, {"plain", "tab\there", "quote\"back\\slash", "\x1b[31mred\x07", "caf\xc3\xa9", ""});
     file.add_strings(0xFFFFFFFF, {"formatted text"});

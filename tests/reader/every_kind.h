@@ -6,6 +6,6 @@
 namespace qn::test
 {
 
-trace_builder every_kind();
+trace_builder every_kind(endian order = endian::little);
 
 } // namespace qn::test

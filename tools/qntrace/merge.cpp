@@ -17,6 +17,7 @@
 #include "tools/qntrace/format/text.h"
 #include "tools/qntrace/select/selection.h"
 #include "tools/qntrace/traces/clock_offsets.h"
+#include "tools/qntrace/traces/origin_members.h"
 #include "tools/qntrace/traces/read_merged.h"
 #include "tools/qntrace/traces/trace_set.h"
 
@@ -83,12 +84,7 @@ public:
     merge_json(const std::vector<trace_source> &sources, bool utc) : format_({false, utc})
     {
         for (const trace_source &source : sources) {
-            text_members origin;
-            if (!source.cluster.empty()) origin.emplace_back("cluster", source.cluster);
-            origin.emplace_back("node", source.node());
-            if (!source.node_id.empty()) origin.emplace_back("node_id", source.node_id);
-            origin.emplace_back("program", source.program);
-            origin.emplace_back("trace", source.trace);
+            text_members origin = origin_members(source);
             origin.emplace_back("file", source.path);
             origins_.push_back(std::move(origin));
         }

@@ -221,4 +221,13 @@ void json_dump::record(std::string &out, const reader::trace_record &record, con
     });
 }
 
+void json_dump::body(std::string &out, const reader::trace_record &record)
+{
+    append_object(out, [&](text_encoder &encode) {
+        json object = json::object();
+        std::visit(body_members(object, encode, record, options_.raw), record.body);
+        return object;
+    });
+}
+
 } // namespace qn::dump

@@ -31,10 +31,12 @@ class json_dump
 public:
     explicit json_dump(const json_options &options) : options_(options), timestamps_(options.utc) {}
 
-    // Both append one line to `out`.
+    // All append one line to `out`.
     void header(std::string &out, std::string_view path, const reader::file_header &header);
     // `origin` names where a record of several files comes from: members that stand before the record's own.
     void record(std::string &out, const reader::trace_record &record, const text_members &origin = {});
+    // Only the members that its kind gives a record.
+    void body(std::string &out, const reader::trace_record &record);
 
 private:
     json_options options_;

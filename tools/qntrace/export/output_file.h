@@ -1,0 +1,47 @@
+// Files that an export writes: from their beginning to their end, through a buffer, and packed when that is asked for.
+#pragma once
+
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include "tools/qntrace/export/compression.h"
+
+namespace qn::dump
+{
+
+// Whatever fails is thrown as an output_error that names the file.
+class output_file
+{
+public:
+    // Makes the file, or empties it.
+    explicit output_file(const std::string &path, compression packed = compression::none);
+    // Without close() the file is not complete.
+    ~output_file();
+    output_file(const output_file &) = delete;
+    output_file &operator=(const output_file &) = delete;
+
+    void write(std::string_view data);
+    void close();
+
+    // Packs what it is given; kept where the libraries for that are known.
+    class packer
+    {
+    public:
+        virtual ~packer() = default;
+        // Appends what there is to be written to `out`.
+        virtual void pack(std::string_view data, bool is_last, std::string &out) = 0;
+    };
+
+private:
+    void write_out(std::string_view data);
+    [[noreturn]] void fail(int error) const;
+
+    std::string path_;
+    int descriptor_ = -1;
+    std::string buffer_;
+    std::unique_ptr<packer> packer_; // or none
+    std::string packed_;
+};
+
+} // namespace qn::dump

@@ -3,6 +3,9 @@
 // A record becomes a complete event that lasts until the next record of its thread, so that viewers which know nothing
 // but stretches of time show it too; but no longer than `longest_ns`, so that a thread that is silent looks idle. The
 // last record of a thread lasts `last_ns`. What is missing is an instant on all tracks.
+//
+// Viewers add the length of an event to its time as floating-point numbers. So that they never find two events nested
+// that follow each other, an event ends a nanosecond before the next one.
 #include <algorithm>
 #include <map>
 #include <optional>
@@ -66,7 +69,7 @@ public:
         for (const trace_source &source : sources) {
             const auto [known, is_new] = numbers.emplace(
                 std::tuple(source.cluster, source.node(), source.node_id, source.program), numbers.size() + 1);
-            sources_.push_back({known->second, origin_with_path(source), {}});
+            sources_.push_back({known->second, {{"path", source.path}}, {}});
             if (is_new) processes_.emplace_back(known->second, fmt::format("{} on {}", source.program, source.node()));
         }
         for (const trace_source &source : sources) {
@@ -161,7 +164,10 @@ private:
     void emit(const event &done, std::optional<std::int64_t> next_ns)
     {
         std::int64_t lasts = last_ns;
-        if (next_ns && (__builtin_sub_overflow(*next_ns, done.ns, &lasts) || lasts > longest_ns)) lasts = longest_ns;
+        if (next_ns) {
+            const bool overflow = __builtin_sub_overflow(*next_ns, done.ns, &lasts);
+            lasts = overflow ? longest_ns : std::min(lasts - 1, longest_ns);
+        }
         write_event(fmt::format("{},\"dur\":{},\"args\":{}}}", done.head,
                                 microseconds(std::max<std::int64_t>(lasts, 0)), done.tail));
     }

@@ -8,7 +8,6 @@
 #include <vector>
 
 #include "tools/qntrace/export/compression.h"
-#include "tools/qntrace/format/json.h"
 #include "tools/qntrace/traces/losses.h"
 #include "tools/qntrace/traces/merged_traces.h"
 #include "tools/qntrace/traces/trace_set.h"
@@ -33,9 +32,6 @@ public:
     // All sources are at their end.
     virtual void finish() = 0;
 };
-
-// Members of a record's JSON object that tell where it comes from.
-text_members origin_with_path(const trace_source &source);
 
 using source_list = std::vector<trace_source>; // outlives the format
 

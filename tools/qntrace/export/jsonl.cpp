@@ -14,6 +14,8 @@
 
 namespace qn::dump
 {
+namespace
+{
 
 text_members origin_with_path(const trace_source &source)
 {
@@ -21,9 +23,6 @@ text_members origin_with_path(const trace_source &source)
     origin.emplace_back("path", source.path); // "file" is what error records call the source that they are about
     return origin;
 }
-
-namespace
-{
 
 std::string suffix_of(compression packed)
 {

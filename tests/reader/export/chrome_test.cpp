@@ -15,9 +15,9 @@ namespace
 
 using nlohmann::json;
 
-json exported_json(const scratch_folder &folder, const strings &arguments, int status = 0)
+json exported_json(const scratch_folder &folder, const strings &arguments)
 {
-    exported("chrome", folder.path("out.json"), arguments, status);
+    exported("chrome", folder.path("out.json"), arguments);
     return json::parse(contents_of(folder.path("out.json")));
 }
 
@@ -53,7 +53,7 @@ TEST_P(Chrome, HasEveryRecordAtItsExactTime)
 {
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
-    const auto found = exported_json(folder, arguments, GetParam().status);
+    const auto found = exported_json(folder, arguments);
     const std::int64_t origin = std::stoll(found.at("otherData").at("origin_ns").get<std::string>());
     const auto times = nanoseconds_in(contents_of(folder.path("out.json")), "ts");
     const auto events = events_of(found, "X");
@@ -83,7 +83,7 @@ TEST_P(Chrome, TellsWhatIsMissing)
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
     counts found = {{"unfinished", 0}, {"missing", 0}, {"overwritten", 0}, {"unspooled_pages", 0}};
-    for (const auto &event : events_of(exported_json(folder, arguments, GetParam().status), "i")) {
+    for (const auto &event : events_of(exported_json(folder, arguments), "i")) {
         EXPECT_EQ(event.at("s"), "g");
         EXPECT_EQ(event.at("name"), "lost");
         for (auto &[what, count] : found) count += event.at("args").value(what, 0U);

@@ -83,7 +83,7 @@ TEST_P(Ctf, BabeltracePrintsEveryRecord)
 {
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
-    exported("ctf", folder.path("out"), arguments, GetParam().status);
+    exported("ctf", folder.path("out"), arguments);
     const auto found = events_in(folder.path("out"));
     EXPECT_EQ(sorted(found), sorted(events_merged(arguments)));
     EXPECT_TRUE(std::is_sorted(found.begin(), found.end(), [](const event &left, const event &right) {
@@ -95,7 +95,7 @@ TEST_P(Ctf, BabeltraceCountsWhatIsMissing)
 {
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
-    exported("ctf", folder.path("out"), arguments, GetParam().status);
+    exported("ctf", folder.path("out"), arguments);
     std::uint64_t missing = 0;
     for (const auto &[what, count] : losses_by_stats(arguments)) missing += count;
     EXPECT_EQ(discarded_in(folder.path("out")), missing);
@@ -105,7 +105,7 @@ TEST_P(Ctf, BabeltraceReadsItsOwnCopyAlike)
 {
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
-    exported("ctf", folder.path("out"), arguments, GetParam().status);
+    exported("ctf", folder.path("out"), arguments);
     shell("babeltrace2 '" + folder.path("out") + "' -o ctf -w '" + folder.path("copy") + "' 2>/dev/null");
     const auto copied = events_in(folder.path("copy"));
     EXPECT_FALSE(copied.empty());
@@ -130,7 +130,7 @@ TEST(CtfExport, HasAllFieldsOfEveryKind)
 {
     const scratch_folder folder;
     const auto arguments = samples().front().make(folder);
-    exported("ctf", folder.path("out"), arguments, 1);
+    exported("ctf", folder.path("out"), arguments);
     const auto found = fields_of(folder.path("out"));
     for (
         const auto &expected : strings{
@@ -198,7 +198,7 @@ TEST(CtfExport, SaysWhatIsWrongWithARecord)
     file.add(12, file.body().u32(22).u32(100).u32(3)); // a hundred values, room for one
     file.add(77, file.body().u32(5));
     file.close();
-    exported("ctf", folder.path("out"), {folder.file("a.trc", file.bytes())}, 1);
+    exported("ctf", folder.path("out"), {folder.file("a.trc", file.bytes())});
     EXPECT_EQ(
         fields_of(folder.path("out")),
         (strings{
@@ -232,7 +232,7 @@ TEST(CtfExport, TellsTheCounterOfRecordsWhoseTimeIsNotKnown)
     file.add_start(1, trace_builder::ticks_per_second, trace_builder::epoch_ns);
     file.add_id(2);
     file.close();
-    exported("ctf", folder.path("out"), {folder.file("a.trc", file.bytes())}, 1);
+    exported("ctf", folder.path("out"), {folder.file("a.trc", file.bytes())});
     EXPECT_EQ(times_and_problems(folder.path("out")),
               (strings{R"(0 the record\'s time is not known, its counter is 1123456789)", "1795237921123457789",
                        "1795237921123458789"}));

@@ -50,7 +50,7 @@ TEST_P(Jsonl, HasTheRecordsThatMergePrints)
 {
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
-    exported("jsonl", folder.path("out"), arguments, GetParam().status);
+    exported("jsonl", folder.path("out"), arguments);
     const auto found = lines_in_tree(folder.path("out"));
     EXPECT_FALSE(found.empty());
     EXPECT_EQ(sorted_without_files(found), sorted_without_files(merged_lines(arguments)));
@@ -60,7 +60,7 @@ TEST_P(Jsonl, CountsInJqWhatStatsCounts)
 {
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
-    exported("jsonl", folder.path("out"), arguments, GetParam().status);
+    exported("jsonl", folder.path("out"), arguments);
     EXPECT_EQ(counts_in(shell("find '" + folder.path("out") + "' -name '*.jsonl' -exec cat {} + | " + count_with_jq)),
               counts_by_stats(arguments));
 }
@@ -69,7 +69,7 @@ TEST_P(Jsonl, TellsOfEverySourceWhatIsMissing)
 {
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
-    exported("jsonl", folder.path("out"), arguments, GetParam().status);
+    exported("jsonl", folder.path("out"), arguments);
     const auto sums = shell("jq -s -r '(\"unfinished\", \"missing\", \"overwritten\", \"unspooled_pages\") as $m | "
                             "\"\\($m)\\t\\(map(.[$m]) | add)\"' '" +
                             folder.path("out/sources.ndjson") + "'");
@@ -82,7 +82,7 @@ TEST(JsonlExport, HasTheLinesOfDumpWithTheirOrigin)
 {
     const scratch_folder folder;
     const auto arguments = samples().front().make(folder);
-    exported("jsonl", folder.path("out"), arguments, 1);
+    exported("jsonl", folder.path("out"), arguments);
     const auto dumped = rows(run_qntrace({"dump", "--json", "--utc", arguments.front()}));
     auto found = lines_in_tree(folder.path("out"));
     ASSERT_EQ(found.size() + 1, dumped.size()); // the header

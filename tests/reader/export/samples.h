@@ -19,7 +19,6 @@ namespace qn::test
 struct sample {
     const char *name;
     strings (*make)(const scratch_folder &);
-    int status = 0; // of a command that reads them
 
     friend std::ostream &operator<<(std::ostream &out, const sample &printed) { return out << printed.name; }
 };
@@ -31,8 +30,8 @@ std::string sample_name(const testing::TestParamInfo<sample> &info);
 // Runs `qntrace export --to FORMAT -o OUT ARGUMENTS`.
 outcome export_to(const std::string &format, const std::string &out, const strings &arguments,
                   const surroundings &around = {});
-// The same; fails the test when the status is another one.
-void exported(const std::string &format, const std::string &out, const strings &arguments, int status = 0);
+// The same; fails the test when the status is not the one with which `qntrace merge` reads the files.
+void exported(const std::string &format, const std::string &out, const strings &arguments);
 
 // The standard output of a shell command; fails the test when that fails.
 std::string shell(const std::string &command);

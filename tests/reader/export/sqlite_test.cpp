@@ -28,7 +28,7 @@ TEST_P(Sqlite, CountsInItsViewsWhatStatsCounts)
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
     const auto database = folder.path("out.db");
-    exported("sqlite", database, arguments, GetParam().status);
+    exported("sqlite", database, arguments);
     auto expected = counts_by_stats(arguments);
     std::erase_if(expected, [](const auto &count) {
         // The column has escapes where stats replaces what is no text.
@@ -47,7 +47,7 @@ TEST_P(Sqlite, HasEveryRecordWithItsTime)
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
     const auto database = folder.path("out.db");
-    exported("sqlite", database, arguments, GetParam().status);
+    exported("sqlite", database, arguments);
     strings expected;
     for (const auto &line : merged_lines(arguments)) {
         const auto object = json::parse(line);
@@ -68,7 +68,7 @@ TEST_P(Sqlite, HasTheBodiesOfDump)
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
     const auto database = folder.path("out.db");
-    exported("sqlite", database, arguments, GetParam().status);
+    exported("sqlite", database, arguments);
     const auto bodies = lines_of(query(database, "SELECT body FROM records ORDER BY record_id;"));
     const auto merged = merged_lines(arguments);
     ASSERT_EQ(bodies.size(), merged.size());
@@ -86,7 +86,7 @@ TEST_P(Sqlite, CountsWhatIsMissing)
     const scratch_folder folder;
     const auto arguments = GetParam().make(folder);
     const auto database = folder.path("out.db");
-    exported("sqlite", database, arguments, GetParam().status);
+    exported("sqlite", database, arguments);
     counts found;
     for (const char *what : {"unfinished", "missing", "overwritten", "unspooled_pages"})
         found[what] = std::stoull(query(database, std::string("SELECT sum(") + what + ") FROM losses;"));
@@ -97,7 +97,7 @@ TEST_P(Sqlite, IsASoundDatabase)
 {
     const scratch_folder folder;
     const auto database = folder.path("out.db");
-    exported("sqlite", database, GetParam().make(folder), GetParam().status);
+    exported("sqlite", database, GetParam().make(folder));
     EXPECT_EQ(query(database, "PRAGMA integrity_check; PRAGMA foreign_key_check;"), "ok\n");
 }
 
@@ -107,7 +107,7 @@ TEST(SqliteExport, KeepsValuesOf64BitsAndWhatIsWrongWithRecords)
 {
     const scratch_folder folder;
     const auto database = folder.path("out.db");
-    exported("sqlite", database, {folder.file("a.trc", every_kind().bytes())}, 1);
+    exported("sqlite", database, {folder.file("a.trc", every_kind().bytes())});
     EXPECT_EQ(query(database, "SELECT json_extract(body, '$.values') FROM records WHERE kind = 'values64';"),
               "[\"7\",\"18446744073709481616\",\"9223372036854775808\"]\n");
     trace_builder file;
@@ -115,7 +115,7 @@ TEST(SqliteExport, KeepsValuesOf64BitsAndWhatIsWrongWithRecords)
     file.add_id(7);
     file.close();
     const auto untimed = folder.path("untimed.db");
-    exported("sqlite", untimed, {folder.file("b.trc", file.bytes())}, 1);
+    exported("sqlite", untimed, {folder.file("b.trc", file.bytes())});
     EXPECT_EQ(query(untimed, "SELECT ifnull(time_ns, 'none'), id, problem FROM records;"),
               "none\t7\tthe record's time is not known, its counter is 1123456789\n");
 }
@@ -124,7 +124,7 @@ TEST(SqliteExport, ShowsErrorsAndSecondsInViews)
 {
     const scratch_folder folder;
     const auto database = folder.path("out.db");
-    exported("sqlite", database, {folder.file("a.trc", every_kind().bytes())}, 1);
+    exported("sqlite", database, {folder.file("a.trc", every_kind().bytes())});
     EXPECT_EQ(query(database, "SELECT comp, id, error_id, function, file, line FROM errors;"),
               "IDX\t31\t18\topen_it\tapp.c\t120\n");
     EXPECT_EQ(query(database, "SELECT second, records FROM per_second;"),

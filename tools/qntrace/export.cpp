@@ -1,5 +1,6 @@
 // qntrace export: records in the formats of other programs.
 #include <algorithm>
+#include <array>
 #include <filesystem>
 #include <memory>
 #include <optional>
@@ -53,6 +54,7 @@ constexpr std::array<format_description, 4> formats = {{
 std::vector<std::string> format_names()
 {
     std::vector<std::string> names;
+    names.reserve(formats.size());
     for (const auto &format : formats) names.emplace_back(format.name);
     return names;
 }
@@ -106,7 +108,7 @@ public:
     exporting(const source_list &sources, const clock_offsets &offsets, const export_options &options,
               export_format &format)
         : sources_(sources), offsets_(offsets), selected_(*options.selected), format_(format),
-          progress_(total_bytes(sources))
+          progress_(total_bytes(sources), false)
     {
     }
 

@@ -1,5 +1,6 @@
 // qntrace export --to ctf: babeltrace2 reads every record, with its exact time, and how many are missing.
 #include <algorithm>
+#include <filesystem>
 #include <regex>
 
 #include <gtest/gtest.h>
@@ -188,6 +189,31 @@ TEST(CtfExport, BeginsAsManyStreamsAsItsClockNeeds)
     exported("ctf", folder.path("out"), samples().at(4).make(folder));
     // 15, 13, 5, 1 are records that go back one below the other, and no five do.
     EXPECT_EQ(shell("find '" + folder.path("out") + "' -name '*.stream*' | wc -l"), "4\n");
+}
+
+TEST(CtfExport, KeepsTheTimesOfManyFilesOfOneNameThatOverlap)
+{
+    const scratch_folder folder;
+    strings files;
+    for (std::uint32_t i = 0; i < 100; ++i) {
+        const auto name = std::to_string(i);
+        std::filesystem::create_directory(folder.path(name));
+        files.push_back(folder.file(name + "/app.trc", ids_from(1000 - i, {i, i, i}).bytes()));
+    }
+    exported("ctf", folder.path("out"), files);
+    EXPECT_EQ(sorted(events_in(folder.path("out"))), sorted(events_merged(files)));
+    EXPECT_EQ(shell("babeltrace2 '" + folder.path("out") + "' | grep -c problem || true"), "0\n");
+}
+
+TEST(CtfExport, CountsWhatIsMissingOfAFileWithoutRecords)
+{
+    const scratch_folder folder;
+    trace_builder file;
+    file.seq = 6; // three records were overwritten
+    file.add(0xFFFF, file.body().u32(1));
+    file.close();
+    exported("ctf", folder.path("out"), {folder.file("a.trc", file.bytes())});
+    EXPECT_EQ(discarded_in(folder.path("out")), 4U);
 }
 
 TEST(CtfExport, SaysWhatIsWrongWithARecord)

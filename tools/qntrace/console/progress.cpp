@@ -15,9 +15,9 @@ constexpr std::uint64_t records_between_looks_at_the_clock = 4096;
 
 } // namespace
 
-progress_line::progress_line(std::uint64_t total_bytes)
+progress_line::progress_line(std::uint64_t total_bytes, bool data_to_stdout)
     : total_bytes_(std::max<std::uint64_t>(total_bytes, 1)),
-      enabled_(isatty(STDERR_FILENO) == 1 && isatty(STDOUT_FILENO) == 0),
+      enabled_(isatty(STDERR_FILENO) == 1 && !(data_to_stdout && isatty(STDOUT_FILENO) == 1)),
       due_(std::chrono::steady_clock::now() + interval)
 {
 }

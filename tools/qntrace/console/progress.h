@@ -10,8 +10,8 @@ namespace qn::dump
 class progress_line
 {
 public:
-    // Shows nothing unless standard error is a terminal, and standard output another file.
-    explicit progress_line(std::uint64_t total_bytes);
+    // Shows nothing unless standard error is a terminal, and standard output another file when there goes the data.
+    explicit progress_line(std::uint64_t total_bytes, bool data_to_stdout = true);
     ~progress_line() { clear(); }
     progress_line(const progress_line &) = delete;
     progress_line &operator=(const progress_line &) = delete;

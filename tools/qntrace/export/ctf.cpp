@@ -3,6 +3,7 @@
 // The time of a stream must not go back, that of a source may. So a record goes to the stream whose newest event is the
 // latest one that is not later than the record, and starts another stream when there is none: as many streams as it
 // takes, and no time is changed. Pages of a trace, which follow each other, share their streams.
+#include <optional>
 #include <set>
 #include <utility>
 
@@ -60,16 +61,17 @@ public:
     void finish() override { close_streams(); }
 
 private:
-    // Sources of one program of a node and one trace come behind each other, and share their streams.
+    // Sources of one program of a node and one trace come behind each other, and share their streams; unless these are
+    // many already, which leaves too little for what the source itself may need.
     void begin(std::size_t source)
     {
-        const trace_source &next = sources_[source];
-        std::string folder = folder_of(next);
-        if (folder == folder_ && next.trace == trace_) return;
+        if (source_ == source) return;
+        source_ = source;
+        std::string folder = folder_of(sources_[source]);
+        if (folder == folder_ && sources_[source].trace == trace_ && streams_.size() <= most_streams / 2) return;
         close_streams();
         folder_ = std::move(folder);
-        trace_ = next.trace;
-        source_ = source;
+        trace_ = sources_[source].trace;
     }
 
     // Null when the time fits no stream, and there are too many to begin another.
@@ -91,7 +93,7 @@ private:
 
     std::uint64_t first_ns() const
     {
-        const auto &first = sources_[source_].first;
+        const auto &first = sources_[*source_].first;
         const auto ns = first && first->time ? nanoseconds_of(*first->time) : std::nullopt;
         return ns && *ns > 0 ? static_cast<std::uint64_t>(*ns) : 0;
     }
@@ -101,7 +103,7 @@ private:
         const std::string path = tree_.add(folder_, trace_ + ".stream", "");
         if (described_.insert(folder_).second) {
             output_file metadata(tree_.whole(folder_ + "/metadata"));
-            metadata.write(ctf_metadata(sources_[source_]));
+            metadata.write(ctf_metadata(sources_[*source_]));
             metadata.close();
         }
         return *streams_.emplace_back(std::make_unique<ctf_stream>(tree_.whole(path), ns));
@@ -124,10 +126,9 @@ private:
     export_tree tree_;
     std::set<std::string> described_; // folders with metadata
 
-    // Of the trace that is being read.
+    std::optional<std::size_t> source_; // that is being read
     std::string folder_;
     std::string trace_;
-    std::size_t source_ = 0; // its first one
     std::vector<std::unique_ptr<ctf_stream>> streams_;
     ctf_stream *last_ = nullptr; // with the newest record
     std::uint64_t told_ = 0;     // how many records are missing from the source, as far as streams tell

@@ -87,7 +87,8 @@ void staged_output::look_at_what_is_there(bool replace)
         return;
     }
     std::error_code error;
-    const bool ours = S_ISDIR(status.st_mode) && (fs::is_empty(path_, error) || fs::exists(fs::path(path_) / marker));
+    const bool ours =
+        S_ISDIR(status.st_mode) && (fs::is_empty(path_, error) || fs::exists(fs::path(path_) / marker, error));
     if (!ours) refuse("is no folder that an export has made, and is not replaced");
 }
 

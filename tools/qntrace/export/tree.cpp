@@ -53,8 +53,11 @@ std::string export_tree::add(const std::string &folder, std::string_view name, s
         throw output_error(fmt::format("{}: cannot be made: {}", printable_name(whole(folder)), error.message()));
     const std::string base = folder + "/" + safe_name(name);
     std::string path = base + std::string(suffix);
-    for (unsigned number = 2; !given_.insert(path).second; ++number)
-        path = fmt::format("{}-{}{}", base, number, suffix);
+    if (given_.insert(path).second) return path;
+    unsigned &number = numbers_.emplace(path, 1).first->second;
+    do {
+        path = fmt::format("{}-{}{}", base, ++number, suffix);
+    } while (!given_.insert(path).second);
     return path;
 }
 

@@ -7,6 +7,7 @@
 // nothing is ever written outside the tree, hidden, or mistaken for a pattern.
 #pragma once
 
+#include <map>
 #include <set>
 #include <string>
 #include <string_view>
@@ -35,6 +36,7 @@ public:
 private:
     std::string root_;
     std::set<std::string> given_;
+    std::map<std::string, unsigned> numbers_; // of paths that were asked for again, the last one
 };
 
 } // namespace qn::dump

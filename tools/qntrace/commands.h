@@ -16,6 +16,7 @@ void add_export_command(CLI::App &app, int &status);
 void add_info_command(CLI::App &app, int &status);
 void add_merge_command(CLI::App &app, int &status);
 void add_salvage_command(CLI::App &app, int &status);
+void add_report_command(CLI::App &app, int &status);
 void add_spool_command(CLI::App &app, int &status);
 void add_stats_command(CLI::App &app, int &status);
 

@@ -30,6 +30,7 @@ int run(int argc, char **argv)
     qn::dump::add_info_command(app, status);
     qn::dump::add_merge_command(app, status);
     qn::dump::add_salvage_command(app, status);
+    qn::dump::add_report_command(app, status);
     qn::dump::add_stats_command(app, status);
     qn::dump::add_spool_command(app, status);
     qn::dump::add_config_command(app, status);

@@ -24,6 +24,7 @@ namespace
 {
 
 constexpr std::size_t usual_top = 10;
+constexpr std::int64_t most_buckets = 60; // what people can look over
 
 struct stats_options {
     bool json = false;
@@ -101,7 +102,7 @@ int show_stats(const stats_options &options)
         int status = set.status;
         for (const trace_source &source : set.sources)
             status = std::max(status, count_file(source.path, options, tally));
-        tally.buckets.finish();
+        tally.buckets.finish(most_buckets);
         write_data(options.json ? stats_json(tally, options.format) : stats_text(tally, options.format));
         flush_data();
         return status;

@@ -22,7 +22,6 @@ constexpr std::array<std::int64_t, 18> widths = {
 };
 
 constexpr std::size_t most_while_counting = 4096;
-constexpr std::int64_t most_shown = 60;
 constexpr std::size_t most_of_given_width = 100'000;
 
 // Rounded down, before the epoch too.
@@ -79,10 +78,16 @@ bool time_buckets::widen()
     return true;
 }
 
-void time_buckets::finish()
+void time_buckets::finish(std::int64_t most)
 {
     if (width_is_given_ || buckets_.empty()) return;
-    while (buckets_.rbegin()->first - buckets_.begin()->first >= most_shown && widen()) {
+    while (buckets_.rbegin()->first - buckets_.begin()->first >= most && widen()) {
+    }
+}
+
+void time_buckets::widen_to(std::int64_t width)
+{
+    while (width_ < width && widen()) {
     }
 }
 

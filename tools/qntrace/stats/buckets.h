@@ -32,8 +32,10 @@ public:
         current_->missing += missing;
     }
 
-    // Without a given width: makes the buckets so wide that they are few enough for people.
-    void finish();
+    // Without a given width: makes the buckets so wide that from the first to the last there are at most so many.
+    void finish(std::int64_t most);
+    // Without a given width: makes the buckets as wide as those of another one that counted these records and more.
+    void widen_to(std::int64_t width);
 
     std::int64_t width() const { return width_; }
     // By their index, which counts widths since the epoch; none is empty.

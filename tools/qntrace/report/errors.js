@@ -1,0 +1,114 @@
+// The table of errors, as `qntrace errors` groups them. Its heads sort it; the time of the last one leads to its record
+// in the timeline.
+import { data, element } from "./data.js";
+import { selectAt } from "./timeline.js";
+import { grouped, plural } from "./units.js";
+
+const rowsAtFirst = 100;
+
+const place = ({ source_file: file, line, function: name }) =>
+  [file || line ? `${file ?? "?"}:${line}` : "", name ? `in ${name}` : ""].filter(Boolean).join(" ");
+
+const ids = (latest) => {
+  const message = `error ${latest.error_id}, set ${latest.message_set} message ${latest.message_number}`;
+  return latest.catalogue === null ? message : `${message} of ${latest.catalogue}`;
+};
+
+const columns = [
+  { name: "Count", key: (group) => group.errors, number: true, text: (group) => grouped(group.errors) },
+  { name: "Message", key: (group) => group.latest.message },
+  { name: "Component", key: (group) => group.latest.comp },
+  { name: "Nodes", key: (group) => group.nodes.map(({ node, errors }) => `${node} ${grouped(errors)}`).join(", ") },
+  { name: "Program", key: (group) => group.latest.program },
+  { name: "First", key: (group) => group.first.time ?? "" },
+  { name: "Last", key: (group) => group.last.time ?? "" },
+];
+
+const shortTime = (text) => text.replace("T", " ").replace(/(\.\d{6})\d*/, "$1").replace(/[+-]\d\d:\d\d$|Z$/, "");
+
+function messageCell(cell, group) {
+  cell.className = "message";
+  cell.append(element("div", "", group.latest.message));
+  const below = [ids(group.latest), place(group.latest), group.latest.ffdc_id ? `ffdc ${group.latest.ffdc_id}` : ""];
+  cell.append(element("div", "muted small", below.filter(Boolean).join("  ·  ")));
+}
+
+function lastCell(cell, group) {
+  if (group.at === null) {
+    cell.textContent = "-";
+    return;
+  }
+  const button = element("button", "link", shortTime(group.last.time));
+  button.type = "button";
+  button.title = "Show it in the timeline";
+  button.addEventListener("click", () => {
+    if (selectAt(group.at)) document.getElementById("timeline").scrollIntoView({ block: "center" });
+  });
+  cell.append(button);
+}
+
+function fill(body, groups) {
+  body.replaceChildren();
+  for (const group of groups) {
+    const row = body.insertRow();
+    for (const column of columns) {
+      const cell = row.insertCell();
+      if (column.number) cell.className = "number";
+      if (column.name === "Message") messageCell(cell, group);
+      else if (column.name === "Last") lastCell(cell, group);
+      else if (column.name === "First") cell.textContent = group.first.time ? shortTime(group.first.time) : "-";
+      else cell.textContent = column.text ? column.text(group) : column.key(group);
+    }
+  }
+}
+
+function compare(left, right) {
+  if (left === right) return 0;
+  return left < right ? -1 : 1;
+}
+
+export function startErrors() {
+  const container = document.getElementById("errors");
+  const { rows, groups } = data.errors;
+  if (rows.length === 0) {
+    container.append(element("p", "empty", "No error records."));
+    return;
+  }
+  document.getElementById("errors-count").textContent =
+    `${plural(data.summary.errors, "error")} in ${plural(groups, "group")}`;
+  const table = element("table", "errors");
+  const head = table.createTHead().insertRow();
+  const body = table.createTBody();
+  let limit = rowsAtFirst;
+  let sorted = { column: 0, down: true };
+  const more = element("button", "", `Show all ${grouped(rows.length)}`);
+  more.type = "button";
+
+  const show = () => {
+    const { key } = columns[sorted.column];
+    const ordered = [...rows].sort((left, right) => compare(key(left), key(right)) * (sorted.down ? -1 : 1));
+    fill(body, ordered.slice(0, limit));
+    more.hidden = limit >= rows.length;
+    [...head.cells].forEach((cell, i) => {
+      cell.setAttribute("aria-sort", i !== sorted.column ? "none" : sorted.down ? "descending" : "ascending");
+    });
+  };
+  columns.forEach((column, i) => {
+    const cell = element("th", column.number ? "number" : "");
+    cell.scope = "col";
+    const button = element("button", "", column.name);
+    button.type = "button";
+    button.addEventListener("click", () => {
+      sorted = { column: i, down: sorted.column === i ? !sorted.down : column.number === true || column.name === "Last" };
+      show();
+    });
+    cell.append(button);
+    head.append(cell);
+  });
+  more.addEventListener("click", () => {
+    limit = rows.length;
+    show();
+  });
+  show();
+  container.append(table, more);
+}

@@ -38,9 +38,7 @@ async function withPage(name, use) {
   const { page, heard } = await open(name);
   try {
     await use(page, heard);
-    assert.deepEqual(heard.messages, []);
-    assert.deepEqual(heard.errors, []);
-    assert.deepEqual(heard.requests, [`file://${join(folder, name)}`]);
+    assert.deepEqual(heard, { messages: [], errors: [], requests: [`file://${join(folder, name)}`] });
   } finally {
     await page.close();
   }
@@ -52,6 +50,14 @@ const colorsOf = (page, selector) =>
     const { data } = canvas.getContext("2d").getImageData(0, 0, canvas.width, canvas.height);
     return new Set(new Uint32Array(data.buffer)).size;
   });
+
+// For those who only look: one page for all of them, opened once.
+let shared;
+const lookAt = (look) => async () => {
+  shared ??= await open("page.html");
+  await look(shared.page);
+  assert.deepEqual(shared.heard, { messages: [], errors: [], requests: [`file://${join(folder, "page.html")}`] });
+};
 
 const picturesOf = (page) =>
   page.evaluate(() => [...document.querySelectorAll("canvas")].map((canvas) => canvas.toDataURL()));
@@ -97,14 +103,14 @@ after(async () => {
   rmSync(folder, { recursive: true, force: true });
 });
 
-test("the charts are drawn", () =>
-  withPage("page.html", async (page) => {
+test("the charts are drawn",
+  lookAt(async (page) => {
     assert.ok((await colorsOf(page, "#rates canvas")) > 10);
     assert.ok((await colorsOf(page, "#timeline canvas")) > 10);
   }));
 
-test("the table has the rows of qntrace errors", () =>
-  withPage("page.html", async (page) => {
+test("the table has the rows of qntrace errors",
+  lookAt(async (page) => {
     const { stdout } = spawnSync(qntrace, ["errors", "--json", "--utc", traces], { encoding: "utf8" });
     const groups = stdout.trim().split("\n").map((line) => JSON.parse(line)).filter(({ type }) => type === "group");
     assert.equal(groups.length, 2);
@@ -129,8 +135,8 @@ test("a head of the table sorts it", () =>
     assert.equal(await page.locator("#errors th").first().getAttribute("aria-sort"), "ascending");
   }));
 
-test("texts out of traces stay texts", () =>
-  withPage("page.html", async (page) => {
+test("texts out of traces stay texts",
+  lookAt(async (page) => {
     assert.equal(await page.title(), "Trace report");
     assert.equal(await page.locator("img, b, iframe").count(), 0);
     assert.equal(await page.locator("script").count(), 2);
@@ -203,8 +209,8 @@ test("the legend takes components out of both charts", () =>
     assert.equal(await chip.getAttribute("aria-pressed"), "false");
   }));
 
-test("the pointer is told what is under it", () =>
-  withPage("page.html", async (page) => {
+test("the pointer is told what is under it",
+  lookAt(async (page) => {
     const box = await page.locator("#rates .u-over").boundingBox();
     await page.mouse.move(box.x + box.width * 0.3, box.y + 100);
     assert.match(await page.locator("#tooltip").textContent(), /IDX.*\/s/);
@@ -220,8 +226,8 @@ test("a page without records says so", () =>
   }));
 
 for (const [scheme, width] of [["light", 1400], ["dark", 1400], ["light", 420]]) {
-  test(`nothing is wider than a ${scheme} page of ${width} pixels`, () =>
-    withPage("page.html", async (page) => {
+  test(`nothing is wider than a ${scheme} page of ${width} pixels`,
+    lookAt(async (page) => {
       await page.emulateMedia({ colorScheme: scheme });
       await page.setViewportSize({ width, height: 900 });
       await afterDrawing(page);

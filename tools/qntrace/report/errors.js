@@ -16,30 +16,34 @@ const ids = (latest) => {
 
 const columns = [
   { name: "Count", key: (group) => group.errors, number: true, text: (group) => grouped(group.errors) },
-  { name: "Message", key: (group) => group.latest.message },
+  { name: "Message", key: (group) => group.latest.message, style: "message" },
   { name: "Component", key: (group) => group.latest.comp },
   { name: "Nodes", key: (group) => group.nodes.map(({ node, errors }) => `${node} ${grouped(errors)}`).join(", ") },
   { name: "Program", key: (group) => group.latest.program },
-  { name: "First", key: (group) => group.first.time ?? "" },
-  { name: "Last", key: (group) => group.last.time ?? "" },
+  { name: "First", key: (group) => group.first.time ?? "", style: "time" },
+  { name: "Last", key: (group) => group.last.time ?? "", style: "time" },
 ];
 
-const shortTime = (text) => text.replace("T", " ").replace(/(\.\d{6})\d*/, "$1").replace(/[+-]\d\d:\d\d$|Z$/, "");
+// "2026-11-21T05:12:01.123456789+01:00": the time above its date; the zone is that of the whole page.
+function timeParts(text) {
+  const [date, time] = text.split("T");
+  return [element("div", "", time.slice(0, 15)), element("div", "muted small", date)];
+}
 
 function messageCell(cell, group) {
-  cell.className = "message";
   cell.append(element("div", "", group.latest.message));
   const below = [ids(group.latest), place(group.latest), group.latest.ffdc_id ? `ffdc ${group.latest.ffdc_id}` : ""];
   cell.append(element("div", "muted small", below.filter(Boolean).join("  ·  ")));
 }
 
 function lastCell(cell, group) {
-  if (group.at === null) {
+  if (group.at === null || !group.last.time) {
     cell.textContent = "-";
     return;
   }
-  const button = element("button", "link", shortTime(group.last.time));
+  const button = element("button", "link");
   button.type = "button";
+  button.append(...timeParts(group.last.time));
   button.title = "Show it in the timeline";
   button.addEventListener("click", () => {
     if (selectAt(group.at)) document.getElementById("timeline").scrollIntoView({ block: "center" });
@@ -53,10 +57,10 @@ function fill(body, groups) {
     const row = body.insertRow();
     for (const column of columns) {
       const cell = row.insertCell();
-      if (column.number) cell.className = "number";
+      cell.className = column.number ? "number" : (column.style ?? "");
       if (column.name === "Message") messageCell(cell, group);
       else if (column.name === "Last") lastCell(cell, group);
-      else if (column.name === "First") cell.textContent = group.first.time ? shortTime(group.first.time) : "-";
+      else if (column.name === "First") cell.append(...(group.first.time ? timeParts(group.first.time) : ["-"]));
       else cell.textContent = column.text ? column.text(group) : column.key(group);
     }
   }

@@ -10,21 +10,23 @@ const rowHeight = 20;
 const tickInset = 4;
 const widestGutter = 229; // as far as the rates' legend and axis reach, see report.css
 
-// Rows and the heads of processes, with their places below the axis.
+// Rows and the heads of processes, with their places below the axis; of each process where it begins and ends.
 function arrange() {
   const items = [];
+  const processes = new Map();
   let top = 0;
-  let process = -1;
   for (const row of data.rows) {
-    if (row.process !== process) {
-      process = row.process;
+    const { process } = row;
+    if (!processes.has(process)) {
+      processes.set(process, { top, bottom: top });
       items.push({ process, top, height: processHeight });
       top += processHeight;
     }
     items.push({ process, row, top, height: rowHeight });
     top += rowHeight;
+    processes.get(process).bottom = top;
   }
-  return { items, height: top };
+  return { items, processes, height: top };
 }
 
 export const lanes = arrange();
@@ -113,15 +115,14 @@ export class LaneDrawing {
     const { context } = this;
     for (const mark of data.marks) {
       if (mark.to < view.from || mark.from > view.to) continue;
-      const items = lanes.items.filter((item) => item.process === mark.process);
-      if (items.length === 0) continue;
+      const process = lanes.processes.get(mark.process);
+      if (!process) continue;
       const left = Math.max(this.x(mark.from), this.gutter);
       const right = Math.max(this.x(mark.to), left + 2);
-      const last = items[items.length - 1];
       context.fillStyle = theme.colors["loss-fill"];
-      context.fillRect(left, items[0].top, right - left, last.top + last.height - items[0].top);
+      context.fillRect(left, process.top, right - left, process.bottom - process.top);
       context.fillStyle = theme.colors.loss;
-      context.fillRect(left, items[0].top, right - left, 3);
+      context.fillRect(left, process.top, right - left, 3);
     }
   }
 
@@ -144,7 +145,7 @@ export class LaneDrawing {
         if (errors[errors.length - 1] !== x) errors.push(x);
         continue;
       }
-      if (x === lastX && component === lastComponent) continue;
+      if (x === lastX) continue;
       if (component !== lastComponent) context.fillStyle = componentColor(component);
       lastX = x;
       lastComponent = component;
@@ -171,8 +172,10 @@ export class LaneDrawing {
     const inset = item.row ? 22 : 10;
     context.textBaseline = "middle";
     context.font = theme.font;
-    const noteWidth = note ? context.measureText(note).width + 14 : 6;
-    if (note) {
+    const room = this.gutter - inset - 6;
+    const noteWidth = note ? context.measureText(note).width + 8 : 0;
+    const hasRoom = context.measureText(text).width + noteWidth <= room;
+    if (note && hasRoom) {
       context.fillStyle = theme.colors.muted;
       context.textAlign = "right";
       context.fillText(note, this.gutter - 8, middle);
@@ -180,7 +183,7 @@ export class LaneDrawing {
     context.font = font;
     context.fillStyle = color;
     context.textAlign = "left";
-    context.fillText(this.cut(text, this.gutter - inset - noteWidth), inset, middle);
+    context.fillText(this.cut(text, room), inset, middle);
   }
 
   // The heads of processes may be longer than the gutter is wide.

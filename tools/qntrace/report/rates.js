@@ -184,14 +184,24 @@ export function startRates() {
   container.setAttribute("role", "img");
   container.setAttribute("aria-label", "Records per second over time, by component. Plus and minus zoom, arrows move.");
   let chart = null;
+  let hidden = null; // what the areas were last made for
   const build = () => {
     if (chart) chart.destroy();
+    hidden = [...view.hidden].join();
     chart = new uPlot(options(container), stacked(), container);
     follow(chart);
+  };
+  const update = () => {
+    if (hidden === [...view.hidden].join()) {
+      chart.setScale("x", { min: view.from, max: view.to });
+      return;
+    }
+    hidden = [...view.hidden].join();
+    chart.setData(stacked());
   };
   build();
   zoomByKeys(container);
   onThemeChange(build);
-  onViewChange(() => chart.setData(stacked()));
+  onViewChange(update);
   new ResizeObserver(() => chart.setSize({ width: container.clientWidth, height })).observe(container);
 }

@@ -167,12 +167,12 @@ export class LaneDrawing {
   }
 
   label(item, text, note, color, font) {
-    const { context } = this;
+    const { context, state } = this;
     const middle = item.top + item.height / 2 + 0.5;
     const inset = item.row ? 22 : 10;
     context.textBaseline = "middle";
     context.font = theme.font;
-    const room = this.gutter - inset - 6;
+    const room = (item.row ? this.gutter : state.width) - inset - 6;
     const noteWidth = note ? context.measureText(note).width + 8 : 0;
     const hasRoom = context.measureText(text).width + noteWidth <= room;
     if (note && hasRoom) {

@@ -12,11 +12,12 @@ seconds=${1:-60}
 build=$PWD/build/fuzz
 
 CC=${CC:-clang} CXX=${CXX:-clang++} cmake -S fuzz -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo >/dev/null
-targets=(levels map sizes selection conf)
+targets=(levels map sizes selection conf reader where)
 cmake --build "$build" --target "${targets[@]/#/fuzz_}" -- --quiet
 
-# A configuration file has a language of its own, and lines of 1022 characters in it.
-declare -A longest=([conf]=4096) words=([conf]=conf)
+# A configuration file has a language of its own, and lines of 1022 characters in it. Trace files have some kilobytes
+# and no words, filter expressions a language too.
+declare -A longest=([conf]=4096 [reader]=8192) words=([conf]=conf [reader]=trace [where]=where)
 
 mkdir -p "$build/failed"
 status=0

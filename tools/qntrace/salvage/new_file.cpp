@@ -19,10 +19,10 @@ new_file::new_file(std::string path, mode_t mode, bool may_replace) : path_(std:
 {
     struct stat status = {};
     if (lstat(path_.c_str(), &status) == 0) {
-        const bool is_ordinary = S_ISREG(status.st_mode) || S_ISLNK(status.st_mode);
         errno = EEXIST;
         if (!may_replace_) fail("is not replaced without --force");
-        if (!is_ordinary) fail("is no regular file");
+        errno = S_ISDIR(status.st_mode) ? EISDIR : EINVAL;
+        if (!S_ISREG(status.st_mode) && !S_ISLNK(status.st_mode)) fail("is not a regular file");
     }
     std::string name = path_ + ".XXXXXX";
     const int descriptor = mkostemp(name.data(), O_CLOEXEC);

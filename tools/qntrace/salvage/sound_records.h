@@ -2,7 +2,7 @@
 //
 // Sequence numbers that do not grow tell that a record is damaged, but not which one: of 10, 12, 78, 16 it is 78, of
 // 10, 12, 4, 16 it is 4. So a record is handed out when the next one has come, and is left out when that one follows the
-// record before it just as well.
+// record before it just as well. The first record has none before it, and gives way.
 #pragma once
 
 #include <cstdint>

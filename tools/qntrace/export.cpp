@@ -15,12 +15,12 @@
 #include "tools/qntrace/commands.h"
 #include "tools/qntrace/console/output.h"
 #include "tools/qntrace/console/progress.h"
+#include "tools/qntrace/console/staged_output.h"
 #include "tools/qntrace/export/format.h"
-#include "tools/qntrace/export/staged_output.h"
 #include "tools/qntrace/export/tree.h"
 #include "tools/qntrace/select/selection.h"
-#include "tools/qntrace/traces/merged_traces.h"
 #include "tools/qntrace/traces/clock_offsets.h"
+#include "tools/qntrace/traces/merged_traces.h"
 #include "tools/qntrace/traces/trace_set.h"
 
 namespace qn::dump

@@ -13,6 +13,7 @@
 #include "tools/qntrace/console/findings.h"
 #include "tools/qntrace/console/output.h"
 #include "tools/qntrace/console/output_file.h"
+#include "tools/qntrace/console/staged_output.h"
 #include "tools/qntrace/report/page.h"
 #include "tools/qntrace/select/selection.h"
 #include "tools/qntrace/traces/clock_offsets.h"
@@ -48,7 +49,7 @@ void check_output(const std::string &output, const std::vector<trace_source> &so
 int write_report(const page_assets &assets, const trace_set &set, const clock_offsets &offsets,
                  const report_options &options)
 {
-    output_file page(options.output);
+    staged_output output(options.output, output_kind::stream, true);
     report_data data(set.sources);
     const auto after_file = [&data](std::size_t source, const losses &lost) { data.finish_file(source, lost); };
     const int status = read_merged(
@@ -61,8 +62,10 @@ int write_report(const page_assets &assets, const trace_set &set, const clock_of
     for (const auto &note : thinning_notes(data)) write_message(note);
     const int worst = std::max(set.status, status);
     const page_options shown = {options.utc, options.title, options.selection_text, worst != status_sound};
+    output_file page(output.path());
     write_page(assets, data, shown, [&page](std::string_view text) { page.write(text); });
-    page.finish();
+    page.close();
+    output.publish();
     return worst;
 }
 

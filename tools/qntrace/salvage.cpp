@@ -1,5 +1,9 @@
 // qntrace salvage: the sound records of a damaged file, as a trace file that is sound or as JSON lines.
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
 #include <memory>
+#include <stdexcept>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -10,8 +14,8 @@
 #include "tools/qntrace/commands.h"
 #include "tools/qntrace/console/findings.h"
 #include "tools/qntrace/console/output.h"
+#include "tools/qntrace/console/staged_output.h"
 #include "tools/qntrace/format/json.h"
-#include "tools/qntrace/salvage/new_file.h"
 #include "tools/qntrace/salvage/ring_writer.h"
 #include "tools/qntrace/salvage/sound_records.h"
 #include "tools/qntrace/traces/losses.h"
@@ -102,6 +106,15 @@ std::string summary(const salvage_options &options, const outcome &result)
     return lost.empty() ? text : fmt::format("{}; lost: {}", text, lost);
 }
 
+struct file_closer {
+    void operator()(std::FILE *file) const { std::fclose(file); }
+};
+
+[[noreturn]] void cannot_be_written(const std::string &path)
+{
+    throw output_error(fmt::format("{}: cannot be written: {}", printable_name(path), std::strerror(errno)));
+}
+
 outcome save(const salvage_options &options, reader::byte_source &source, reader::trace_reader &trace)
 {
     if (options.output.empty()) {
@@ -111,10 +124,16 @@ outcome save(const salvage_options &options, reader::byte_source &source, reader
     }
     struct stat status = {};
     const mode_t mode = stat(options.file.c_str(), &status) == 0 ? status.st_mode & 0666 : 0600;
-    new_file file(options.output, mode, options.force);
-    const auto write = [&file](std::string_view data) { std::fwrite(data.data(), 1, data.size(), file.stream()); };
-    const auto result = options.json ? save_json(options, trace, write) : save_trace(source, trace, file.stream());
-    file.put_in_place();
+    staged_output output(options.output, output_kind::file, options.force);
+    const std::unique_ptr<std::FILE, file_closer> file(std::fopen(output.path().c_str(), "wbe"));
+    if (!file) cannot_be_written(options.output);
+    fchmod(fileno(file.get()), mode);
+    const auto write = [&file](std::string_view data) { std::fwrite(data.data(), 1, data.size(), file.get()); };
+    const auto result = options.json ? save_json(options, trace, write) : save_trace(source, trace, file.get());
+    // What was refused earlier is not forgotten: a full disk may have room for the last bytes again.
+    const bool written = std::ferror(file.get()) == 0;
+    if (std::fflush(file.get()) != 0 || !written) cannot_be_written(options.output);
+    output.publish();
     return result;
 }
 
@@ -137,6 +156,9 @@ int salvage(const salvage_options &options)
     } catch (const reader::io_error &error) {
         write_message(fmt::format("{}: {}", printable_name(options.file), error.what()));
         return status_io_error;
+    } catch (const std::invalid_argument &error) {
+        write_message(error.what());
+        return status_usage;
     }
 }
 

@@ -118,11 +118,17 @@ test("the table has the rows of qntrace errors",
       String(errors),
       latest.message,
       latest.comp,
-      nodes.map((node) => `${node.node} ${node.errors}`).join(", "),
+      nodes.map(({ node, errors: count }) => `${node} ${count}`).join(", "),
       latest.program,
     ]);
     const rows = await page.locator("#errors tbody tr").evaluateAll((all) =>
-      all.map((row) => [...row.cells].slice(0, 5).map((cell) => (cell.firstElementChild ?? cell).textContent)));
+      all.map(({ cells: [count, message, component, nodes, program] }) => [
+        count.textContent,
+        message.firstElementChild.textContent,
+        component.textContent,
+        [...nodes.children].map((node) => node.textContent).join(", "),
+        program.textContent,
+      ]));
     assert.deepEqual(rows, wanted);
   }));
 

@@ -1,10 +1,12 @@
 #include "tools/qntrace/console/output_file.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <utility>
 
+#include <fcntl.h>
 #include <fmt/format.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include "tools/qntrace/console/findings.h"
@@ -12,36 +14,72 @@
 
 namespace qn::dump
 {
-
-output_file::output_file(const std::string &path) : path_(path), written_path_(path)
+namespace
 {
-    struct stat status = {};
-    if (lstat(path.c_str(), &status) != 0 || S_ISREG(status.st_mode))
-        written_path_ = fmt::format("{}.{}.part", path, getpid());
-    file_.reset(std::fopen(written_path_.c_str(), "we"));
-    if (!file_) fail();
+
+constexpr std::size_t buffer_bytes = 256 * 1024;
+
+} // namespace
+
+output_file::output_file(const std::string &path, std::unique_ptr<packer> packing)
+    : path_(path), descriptor_(open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0666)),
+      packer_(std::move(packing))
+{
+    if (descriptor_ < 0) fail(errno);
+    buffer_.reserve(buffer_bytes);
 }
 
 output_file::~output_file()
 {
-    if (file_ && written_path_ != path_) unlink(written_path_.c_str());
+    if (descriptor_ >= 0) ::close(descriptor_);
 }
 
-void output_file::write(std::string_view text)
+void output_file::write(std::string_view data)
 {
-    if (std::fwrite(text.data(), 1, text.size(), file_.get()) != text.size()) fail();
+    if (!buffer_.empty() && buffer_.size() + data.size() > buffer_bytes) {
+        write_out(buffer_);
+        buffer_.clear();
+    }
+    if (data.size() > buffer_bytes) {
+        for (; !data.empty(); data.remove_prefix(std::min(data.size(), buffer_bytes)))
+            write_out(data.substr(0, buffer_bytes));
+    } else {
+        buffer_ += data;
+    }
 }
 
-void output_file::finish()
+void output_file::close()
 {
-    if (std::fflush(file_.get()) != 0) fail();
-    if (written_path_ != path_ && std::rename(written_path_.c_str(), path_.c_str()) != 0) fail();
-    file_.reset();
+    write_out(buffer_);
+    buffer_.clear();
+    if (packer_) {
+        const auto last = std::move(packer_);
+        packed_.clear();
+        last->pack({}, true, packed_);
+        write_out(packed_);
+    }
+    const int descriptor = descriptor_;
+    descriptor_ = -1;
+    if (::close(descriptor) != 0) fail(errno);
 }
 
-void output_file::fail() const
+void output_file::write_out(std::string_view data)
 {
-    throw output_error(fmt::format("{} cannot be written: {}", printable_name(path_), std::strerror(errno)));
+    if (packer_) {
+        packed_.clear();
+        packer_->pack(data, false, packed_);
+        data = packed_;
+    }
+    while (!data.empty()) {
+        const ssize_t written = ::write(descriptor_, data.data(), data.size());
+        if (written < 0 && errno != EINTR) fail(errno);
+        if (written > 0) data.remove_prefix(static_cast<std::size_t>(written));
+    }
+}
+
+void output_file::fail(int error) const
+{
+    throw output_error(fmt::format("{}: cannot be written: {}", printable_name(path_), std::strerror(error)));
 }
 
 } // namespace qn::dump

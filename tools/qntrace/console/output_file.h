@@ -1,7 +1,7 @@
-// A file that a command writes beside its output.
+// Files that the command makes: written from their beginning to their end, through a buffer, packed when that is asked
+// for.
 #pragma once
 
-#include <cstdio>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -9,31 +9,38 @@
 namespace qn::dump
 {
 
-// Written under another name in the same folder, and given its own when it is complete: until then the file that had
-// the name is as it was, and goes on being so when the command does not come to its end. What is there and no regular
-// file (a link like /dev/stdout, a pipe, a terminal) is written as it is.
+// Whatever fails is thrown as an output_error that names the file.
 class output_file
 {
 public:
-    // Throws output_error, as write() and finish() do.
-    explicit output_file(const std::string &path);
-    ~output_file(); // takes away what is not complete
+    // Packs what it is given.
+    class packer
+    {
+    public:
+        virtual ~packer() = default;
+        // Appends what there is to be written to `out`.
+        virtual void pack(std::string_view data, bool is_last, std::string &out) = 0;
+    };
+
+    // Makes the file, or empties it.
+    explicit output_file(const std::string &path, std::unique_ptr<packer> packing = nullptr);
+    // Without close() the file is not complete.
+    ~output_file();
     output_file(const output_file &) = delete;
     output_file &operator=(const output_file &) = delete;
 
-    void write(std::string_view text);
-    void finish();
+    void write(std::string_view data);
+    void close();
 
 private:
-    [[noreturn]] void fail() const;
-
-    struct close_file {
-        void operator()(std::FILE *file) const { std::fclose(file); }
-    };
+    void write_out(std::string_view data);
+    [[noreturn]] void fail(int error) const;
 
     std::string path_;
-    std::string written_path_; // the same for what is no regular file
-    std::unique_ptr<std::FILE, close_file> file_;
+    int descriptor_ = -1;
+    std::string buffer_;
+    std::unique_ptr<packer> packer_; // or none
+    std::string packed_;
 };
 
 } // namespace qn::dump

@@ -16,8 +16,8 @@
 #include <fmt/format.h>
 #include <nlohmann/json.hpp>
 
+#include "tools/qntrace/console/output_file.h"
 #include "tools/qntrace/export/format.h"
-#include "tools/qntrace/export/output_file.h"
 #include "tools/qntrace/export/record_time.h"
 #include "tools/qntrace/format/durations.h"
 #include "tools/qntrace/format/escape.h"

@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "tools/qntrace/export/output_file.h"
+#include "tools/qntrace/console/output_file.h"
 
 namespace qn::dump
 {

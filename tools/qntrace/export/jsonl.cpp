@@ -6,8 +6,8 @@
 
 #include <nlohmann/json.hpp>
 
+#include "tools/qntrace/console/output_file.h"
 #include "tools/qntrace/export/format.h"
-#include "tools/qntrace/export/output_file.h"
 #include "tools/qntrace/export/tree.h"
 #include "tools/qntrace/format/json.h"
 #include "tools/qntrace/traces/origin_members.h"
@@ -67,7 +67,7 @@ private:
         origin_ = origin_with_path(source);
         path_ =
             tree_.add(folder_of(source), std::filesystem::path(source.path).filename().string(), suffix_of(packed_));
-        file_.emplace(tree_.whole(path_), packed_);
+        file_.emplace(tree_.whole(path_), make_packer(packed_));
     }
 
     // Bytes that are no UTF-8 are replaced: the records have the same texts with every byte kept.

@@ -5,6 +5,7 @@ import { selectAt } from "./timeline.js";
 import { grouped, plural } from "./units.js";
 
 const rowsAtFirst = 100;
+const mostNodes = 5; // in a row
 
 const place = ({ source_file: file, line, function: name }) =>
   [file || line ? `${file ?? "?"}:${line}` : "", name ? `in ${name}` : ""].filter(Boolean).join(" ");
@@ -18,7 +19,7 @@ const columns = [
   { name: "Count", key: (group) => group.errors, number: true, text: (group) => grouped(group.errors) },
   { name: "Message", key: (group) => group.latest.message, style: "message" },
   { name: "Component", key: (group) => group.latest.comp },
-  { name: "Nodes", key: (group) => group.nodes.map(({ node, errors }) => `${node} ${grouped(errors)}`).join(", ") },
+  { name: "Nodes", key: (group) => group.nodes[0].node, style: "nodes" },
   { name: "Program", key: (group) => group.latest.program },
   { name: "First", key: (group) => group.first.time ?? "", style: "time" },
   { name: "Last", key: (group) => group.last.time ?? "", style: "time" },
@@ -34,6 +35,14 @@ function messageCell(cell, group) {
   cell.append(element("div", "", group.latest.message));
   const below = [ids(group.latest), place(group.latest), group.latest.ffdc_id ? `ffdc ${group.latest.ffdc_id}` : ""];
   cell.append(element("div", "muted small", below.filter(Boolean).join("  ·  ")));
+}
+
+function nodesCell(cell, group) {
+  for (const { node, errors } of group.nodes.slice(0, mostNodes)) {
+    cell.append(element("div", "", `${node} ${grouped(errors)}`));
+  }
+  const more = group.nodes.length - mostNodes;
+  if (more > 0) cell.append(element("div", "muted small", `and ${plural(more, "node")} more`));
 }
 
 function lastCell(cell, group) {
@@ -59,6 +68,7 @@ function fill(body, groups) {
       const cell = row.insertCell();
       cell.className = column.number ? "number" : (column.style ?? "");
       if (column.name === "Message") messageCell(cell, group);
+      else if (column.name === "Nodes") nodesCell(cell, group);
       else if (column.name === "Last") lastCell(cell, group);
       else if (column.name === "First") cell.append(...(group.first.time ? timeParts(group.first.time) : ["-"]));
       else cell.textContent = column.text ? column.text(group) : column.key(group);

@@ -1,4 +1,4 @@
-// Where an export writes, so that what has the name that the user gave is always whole.
+// Where a command writes, so that what has the name that the user gave is always whole.
 //
 // The output is made beside its place under another name, NAME.partial-XXXXXX, and gets its own name when it is
 // complete. What was begun and given up is removed.
@@ -11,7 +11,7 @@ namespace qn::dump
 
 enum class output_kind {
     file,
-    stream, // a file, or a device or FIFO that is there already and is written to as it is
+    stream, // a file; a device, FIFO or link that is there already is written to as it is
     folder, // with the file `marker` in it, by which an export knows that it may replace it
 };
 
@@ -35,6 +35,7 @@ public:
 private:
     void look_at_what_is_there(bool replace);
     void make();
+    void make_durable();
     void replace_folder();
     [[noreturn]] void fail(const char *what, int error) const;
 

@@ -1,4 +1,4 @@
-#include "tools/qntrace/export/staged_output.h"
+#include "tools/qntrace/console/staged_output.h"
 
 #include <cerrno>
 #include <cstdio>
@@ -15,7 +15,7 @@
 
 #include "tools/qntrace/console/findings.h"
 #include "tools/qntrace/console/output.h"
-#include "tools/qntrace/export/output_file.h"
+#include "tools/qntrace/console/output_file.h"
 
 namespace qn::dump
 {
@@ -76,12 +76,10 @@ void staged_output::look_at_what_is_there(bool replace)
     there_ = true;
     struct stat target = {};
     const bool is_special = stat(path_.c_str(), &target) == 0 && !S_ISREG(target.st_mode) && !S_ISDIR(target.st_mode);
-    if (is_special) {
-        if (kind_ != output_kind::stream) refuse("is neither a file nor a folder");
-        direct_ = true;
-        return;
-    }
-    if (!replace) refuse("is there already; --force replaces it");
+    if (is_special && kind_ != output_kind::stream) refuse("is neither a file nor a folder");
+    if (!is_special && !replace) refuse("is there already; --force replaces it");
+    direct_ = is_special || (kind_ == output_kind::stream && S_ISLNK(status.st_mode));
+    if (direct_) return;
     if (kind_ != output_kind::folder) {
         if (S_ISDIR(status.st_mode)) refuse("is a folder, and the output is a file");
         return;
@@ -104,6 +102,7 @@ void staged_output::make()
 void staged_output::publish()
 {
     if (direct_) return;
+    if (kind_ != output_kind::folder) make_durable();
     if (there_ && kind_ == output_kind::folder) {
         replace_folder();
     } else if (there_) {
@@ -114,6 +113,15 @@ void staged_output::publish()
         if (!free_name || rename(work_path_.c_str(), path_.c_str()) != 0) fail("cannot be given its name", errno);
     }
     published_ = true;
+}
+
+// A file that had the name is not given up for one that a power failure would leave empty.
+void staged_output::make_durable()
+{
+    const int descriptor = open(work_path_.c_str(), O_RDONLY | O_CLOEXEC);
+    const int error = descriptor < 0 || fsync(descriptor) != 0 ? errno : 0;
+    if (descriptor >= 0) close(descriptor);
+    if (error != 0) fail("cannot be written", error);
 }
 
 void staged_output::replace_folder()

@@ -58,11 +58,7 @@ void add_check_command(CLI::App &app, int &status)
     auto *json = command->add_flag("--json", options->json, "Print one JSON object a file instead of text");
     command->add_flag("-q,--quiet", options->quiet, "Print nothing; the exit status tells")->excludes(json);
     command->add_flag("--utc", options->utc, "Print times in UTC instead of the local time zone");
-    command
-        ->add_option("FILE", options->files,
-                     "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"
-                     "copies below them and the trace files in them")
-        ->required();
+    add_traces_option(*command, options->files);
     command->callback([options, &status] { status = check_all(*options); });
 }
 

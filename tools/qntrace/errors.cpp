@@ -2,7 +2,6 @@
 #include <algorithm>
 #include <map>
 #include <memory>
-#include <stdexcept>
 #include <string>
 #include <utility>
 #include <vector>
@@ -151,15 +150,10 @@ int print_errors(const std::vector<trace_source> &sources, const clock_offsets &
 
 int show_errors(const errors_options &options)
 {
-    try {
-        const clock_offsets offsets(options.offsets);
-        const trace_set set = find_traces(options.files);
-        offsets.check(set.sources);
-        return std::max(set.status, print_errors(set.sources, offsets, options));
-    } catch (const std::invalid_argument &error) {
-        write_message(error.what());
-        return status_usage;
-    }
+    const clock_offsets offsets(options.offsets);
+    const trace_set set = find_traces(options.files);
+    offsets.check(set.sources);
+    return std::max(set.status, print_errors(set.sources, offsets, options));
 }
 
 // An option that takes one of a few words.
@@ -192,11 +186,7 @@ void add_errors_command(CLI::App &app, int &status)
     command->add_flag("--all", options->all, "Print every error record, in order of time")->excludes(top);
     add_offset_option(*command, options->offsets);
     options->selected = add_selection_options(*command);
-    command
-        ->add_option("FILE", options->files,
-                     "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"
-                     "copies below them and the trace files in them")
-        ->required();
+    add_traces_option(*command, options->files);
     command->callback([options, &status] { status = show_errors(*options); });
 }
 

@@ -1,7 +1,6 @@
 // qntrace export: records in the formats of other programs.
 #include <algorithm>
 #include <array>
-#include <filesystem>
 #include <memory>
 #include <optional>
 #include <stdexcept>
@@ -78,16 +77,6 @@ std::unique_ptr<export_format> make_format(const export_options &options, const 
     if (options.format == "ctf") return make_ctf_export(sources, path);
     if (options.format == "chrome") return make_chrome_export(sources, path);
     return make_sqlite_export(sources, path);
-}
-
-// Throws std::invalid_argument when the output would replace what is read.
-void check_output(const std::string &output, const source_list &sources)
-{
-    for (const trace_source &source : sources) {
-        std::error_code error;
-        if (std::filesystem::equivalent(output, source.path, error))
-            throw std::invalid_argument("the output is one of the trace files");
-    }
 }
 
 // The sources of a node, program and trace behind each other, in the order of time.
@@ -167,7 +156,7 @@ int export_records(const export_options &options)
     trace_set set = find_traces(options.files);
     if (set.sources.empty() && set.status != status_sound) return set.status;
     offsets.check(set.sources);
-    check_output(options.output, set.sources);
+    check_output(options.output, set);
     if (set.sources.empty()) write_message("there are no trace files");
     if (!chosen.in_one_order) sort_by_trace(set.sources);
 
@@ -178,16 +167,6 @@ int export_records(const export_options &options)
     format->finish();
     output.publish();
     return std::max(set.status, status);
-}
-
-int export_or_tell(const export_options &options)
-{
-    try {
-        return export_records(options);
-    } catch (const std::invalid_argument &error) {
-        write_message(error.what());
-        return status_usage;
-    }
 }
 
 } // namespace
@@ -211,12 +190,8 @@ void add_export_command(CLI::App &app, int &status)
         ->check(CLI::IsMember({"gzip", "zstd"}));
     add_offset_option(*command, options->offsets);
     options->selected = add_selection_options(*command);
-    command
-        ->add_option("FILE", options->files,
-                     "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"
-                     "copies below them and the trace files in them")
-        ->required();
-    command->callback([options, &status] { status = export_or_tell(*options); });
+    add_traces_option(*command, options->files);
+    command->callback([options, &status] { status = export_records(*options); });
 }
 
 } // namespace qn::dump

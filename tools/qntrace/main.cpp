@@ -6,6 +6,7 @@
 #include <csignal>
 #include <exception>
 #include <iostream>
+#include <stdexcept>
 
 #include <fmt/format.h>
 
@@ -40,6 +41,9 @@ int run(int argc, char **argv)
     } catch (const CLI::ParseError &error) {
         const bool asked_for = app.exit(error, std::cout, std::cerr) == 0;
         return asked_for ? qn::dump::status_sound : qn::dump::status_usage;
+    } catch (const std::invalid_argument &error) { // arguments that a command cannot do anything with
+        qn::dump::write_message(error.what());
+        return qn::dump::status_usage;
     }
     return status;
 }

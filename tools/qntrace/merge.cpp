@@ -1,7 +1,6 @@
 // qntrace merge: the records of many files in one order by time.
 #include <algorithm>
 #include <memory>
-#include <stdexcept>
 #include <string>
 #include <utility>
 #include <vector>
@@ -118,25 +117,20 @@ int print_merged(const std::vector<trace_source> &sources, const clock_offsets &
 
 int merge(const merge_options &options)
 {
-    try {
-        const clock_offsets offsets(options.offsets);
-        const trace_set set = find_traces(options.files);
-        offsets.check(set.sources);
-        if (set.sources.empty()) {
-            if (set.status == status_sound) write_message("there are no trace files");
-            return set.status;
-        }
-        if (options.json) {
-            merge_json format(set.sources, options.utc);
-            return std::max(set.status, print_merged(set.sources, offsets, options, format));
-        }
-        merge_text format(set.sources, options.utc);
-        write_data(format.heads());
-        return std::max(set.status, print_merged(set.sources, offsets, options, format));
-    } catch (const std::invalid_argument &error) {
-        write_message(error.what());
-        return status_usage;
+    const clock_offsets offsets(options.offsets);
+    const trace_set set = find_traces(options.files);
+    offsets.check(set.sources);
+    if (set.sources.empty()) {
+        if (set.status == status_sound) write_message("there are no trace files");
+        return set.status;
     }
+    if (options.json) {
+        merge_json format(set.sources, options.utc);
+        return std::max(set.status, print_merged(set.sources, offsets, options, format));
+    }
+    merge_text format(set.sources, options.utc);
+    write_data(format.heads());
+    return std::max(set.status, print_merged(set.sources, offsets, options, format));
 }
 
 } // namespace
@@ -150,11 +144,7 @@ void add_merge_command(CLI::App &app, int &status)
     add_offset_option(*command, options->offsets);
     command->add_flag("--no-pager", options->no_pager, no_pager_help);
     options->selected = add_selection_options(*command);
-    command
-        ->add_option("FILE", options->files,
-                     "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"
-                     "copies below them and the trace files in them")
-        ->required();
+    add_traces_option(*command, options->files);
     command->callback([options, &status] {
         const pager screen(!options->json && !options->no_pager);
         status = merge(*options);

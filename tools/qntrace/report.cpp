@@ -1,13 +1,11 @@
 // qntrace report: the records of many files as a page for a browser.
 #include <algorithm>
 #include <memory>
-#include <stdexcept>
 #include <string>
 #include <vector>
 
 #include <fmt/format.h>
 #include <fmt/ranges.h>
-#include <sys/stat.h>
 
 #include "tools/qntrace/commands.h"
 #include "tools/qntrace/console/findings.h"
@@ -33,18 +31,6 @@ struct report_options {
     std::shared_ptr<const selection> selected;
     std::string selection_text; // the options that select, as they were given
 };
-
-// Throws std::invalid_argument for a page that would take the place of a trace.
-void check_output(const std::string &output, const std::vector<trace_source> &sources)
-{
-    struct stat page = {};
-    if (stat(output.c_str(), &page) != 0) return;
-    const bool is_read = std::any_of(sources.begin(), sources.end(), [&page](const trace_source &source) {
-        struct stat trace = {};
-        return stat(source.path.c_str(), &trace) == 0 && trace.st_dev == page.st_dev && trace.st_ino == page.st_ino;
-    });
-    if (is_read) throw std::invalid_argument(fmt::format("{} is one of the traces", printable_name(output)));
-}
 
 int write_report(const page_assets &assets, const trace_set &set, const clock_offsets &offsets,
                  const report_options &options)
@@ -76,20 +62,15 @@ int make_report(const report_options &options)
         write_message("this build has no report: there was no npm when it was configured");
         return status_usage;
     }
-    try {
-        const clock_offsets offsets(options.offsets);
-        const trace_set set = find_traces(options.files);
-        offsets.check(set.sources);
-        check_output(options.output, set.sources);
-        if (set.sources.empty()) {
-            if (set.status == status_sound) write_message("there are no trace files");
-            return set.status;
-        }
-        return write_report(*assets, set, offsets, options);
-    } catch (const std::invalid_argument &error) {
-        write_message(error.what());
-        return status_usage;
+    const clock_offsets offsets(options.offsets);
+    const trace_set set = find_traces(options.files);
+    offsets.check(set.sources);
+    check_output(options.output, set);
+    if (set.sources.empty()) {
+        if (set.status == status_sound) write_message("there are no trace files");
+        return set.status;
     }
+    return write_report(*assets, set, offsets, options);
 }
 
 // Those that add_selection_options() has added, as far as they were given.
@@ -116,11 +97,7 @@ void add_report_command(CLI::App &app, int &status)
     command->add_flag("--utc", options->utc, "Show times in UTC instead of the local time zone");
     add_offset_option(*command, options->offsets);
     options->selected = add_selection_options(*command);
-    command
-        ->add_option("FILE", options->files,
-                     "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"
-                     "copies below them and the trace files in them")
-        ->required();
+    add_traces_option(*command, options->files);
     command->callback([options, command, &status] {
         options->selection_text = given_selection(*command);
         status = make_report(*options);

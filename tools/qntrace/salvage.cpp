@@ -3,7 +3,6 @@
 #include <cstdio>
 #include <cstring>
 #include <memory>
-#include <stdexcept>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -156,9 +155,6 @@ int salvage(const salvage_options &options)
     } catch (const reader::io_error &error) {
         write_message(fmt::format("{}: {}", printable_name(options.file), error.what()));
         return status_io_error;
-    } catch (const std::invalid_argument &error) {
-        write_message(error.what());
-        return status_usage;
     }
 }
 

@@ -96,20 +96,14 @@ std::optional<std::int64_t> bucket_width(const std::string &text)
 
 int show_stats(const stats_options &options)
 {
-    try {
-        stats_tally tally(bucket_width(options.bucket));
-        const trace_set set = find_traces(options.files);
-        int status = set.status;
-        for (const trace_source &source : set.sources)
-            status = std::max(status, count_file(source.path, options, tally));
-        tally.buckets.finish(most_buckets);
-        write_data(options.json ? stats_json(tally, options.format) : stats_text(tally, options.format));
-        flush_data();
-        return status;
-    } catch (const std::invalid_argument &error) {
-        write_message(error.what());
-        return status_usage;
-    }
+    stats_tally tally(bucket_width(options.bucket));
+    const trace_set set = find_traces(options.files);
+    int status = set.status;
+    for (const trace_source &source : set.sources) status = std::max(status, count_file(source.path, options, tally));
+    tally.buckets.finish(most_buckets);
+    write_data(options.json ? stats_json(tally, options.format) : stats_text(tally, options.format));
+    flush_data();
+    return status;
 }
 
 } // namespace
@@ -127,11 +121,7 @@ void add_stats_command(CLI::App &app, int &status)
                      fmt::format("How many components, ids and threads to show, {} unless given; 0: all", usual_top))
         ->type_name("N");
     options->selected = add_selection_options(*command);
-    command
-        ->add_option("FILE", options->files,
-                     "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"
-                     "copies below them and the trace files in them")
-        ->required();
+    add_traces_option(*command, options->files);
     command->callback([options, &status] { status = show_stats(*options); });
 }
 

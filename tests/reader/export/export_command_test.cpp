@@ -89,7 +89,7 @@ TEST_P(EveryFormat, NeverReplacesWhatItReads)
     const auto before = contents_of(file);
     const auto made = export_to(GetParam(), file, {file, "--force"});
     EXPECT_EQ(made.status, 2);
-    EXPECT_EQ(made.err, "qntrace: the output is one of the trace files\n");
+    EXPECT_EQ(made.err, "qntrace: " + file + " is one of the traces\n");
     EXPECT_EQ(contents_of(file), before);
 }
 

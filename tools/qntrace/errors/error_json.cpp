@@ -1,5 +1,7 @@
 #include "tools/qntrace/errors/error_json.h"
 
+#include "tools/qntrace/traces/origin_members.h"
+
 namespace qn::dump
 {
 namespace
@@ -36,14 +38,10 @@ json message_members(const error_event &event, const json_text &text)
             {"ffdc_id", text_or_null(event.ffdc_id)}};
 }
 
-json origin_members(const error_event &event, const trace_source &source, const json_text &text)
+json place_members(const error_event &event, const trace_source &source, const json_text &text)
 {
     json object;
-    if (!source.cluster.empty()) object["cluster"] = text(source.cluster);
-    object["node"] = text(source.node());
-    if (!source.node_id.empty()) object["node_id"] = text(source.node_id);
-    object["program"] = text(source.program);
-    object["trace"] = text(source.trace);
+    for (const auto &[name, value] : origin_members(source)) object[name] = text(value);
     object["file"] = text(source.path);
     object["comp"] = text(event.component);
     object["thread"] = event.thread;
@@ -64,7 +62,7 @@ json event_json(const error_event &event, const trace_source &source, timestamps
 {
     json object = {{"type", "error"}};
     object.update(time_json(event.time, times));
-    object.update(origin_members(event, source, text));
+    object.update(place_members(event, source, text));
     object.update(message_members(event, text));
     return object;
 }

@@ -6,9 +6,11 @@
 #include <filesystem>
 #include <map>
 #include <regex>
+#include <stdexcept>
 #include <string_view>
 #include <utility>
 
+#include <CLI/CLI.hpp>
 #include <fmt/format.h>
 
 #include "tools/qntrace/console/findings.h"
@@ -216,6 +218,24 @@ trace_set find_traces(const std::vector<std::string> &arguments, duplicates choi
     if (choice == duplicates::dropped) drop_duplicates(set.sources);
     share_hosts(set.sources);
     return set;
+}
+
+void add_traces_option(CLI::App &command, std::vector<std::string> &arguments)
+{
+    command
+        .add_option("FILE", arguments,
+                    "Trace files, pages and copies; traces by name, for all of their pages; folders, for all\n"
+                    "copies below them and the trace files in them")
+        ->required();
+}
+
+void check_output(const std::string &output, const trace_set &traces)
+{
+    for (const trace_source &source : traces.sources) {
+        std::error_code error;
+        if (fs::equivalent(output, source.path, error))
+            throw std::invalid_argument(fmt::format("{} is one of the traces", printable_name(output)));
+    }
 }
 
 } // namespace qn::dump

@@ -25,6 +25,11 @@
 
 #include "tools/qntrace/reader/reader.h"
 
+namespace CLI
+{
+class App;
+}
+
 namespace qn::dump
 {
 
@@ -68,5 +73,11 @@ struct trace_set {
 enum class duplicates { dropped, kept };
 
 trace_set find_traces(const std::vector<std::string> &arguments, duplicates choice = duplicates::dropped);
+
+// Adds FILE..., whose values go to `arguments`.
+void add_traces_option(CLI::App &command, std::vector<std::string> &arguments);
+
+// Throws std::invalid_argument when a file that is to be written is one of the traces.
+void check_output(const std::string &output, const trace_set &traces);
 
 } // namespace qn::dump

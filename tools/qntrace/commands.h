@@ -13,6 +13,7 @@ void add_config_command(CLI::App &app, int &status);
 void add_dump_command(CLI::App &app, int &status);
 void add_errors_command(CLI::App &app, int &status);
 void add_export_command(CLI::App &app, int &status);
+void add_follow_command(CLI::App &app, int &status);
 void add_info_command(CLI::App &app, int &status);
 void add_merge_command(CLI::App &app, int &status);
 void add_salvage_command(CLI::App &app, int &status);

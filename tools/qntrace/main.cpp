@@ -28,6 +28,7 @@ int run(int argc, char **argv)
     qn::dump::add_dump_command(app, status);
     qn::dump::add_errors_command(app, status);
     qn::dump::add_export_command(app, status);
+    qn::dump::add_follow_command(app, status);
     qn::dump::add_info_command(app, status);
     qn::dump::add_merge_command(app, status);
     qn::dump::add_salvage_command(app, status);

@@ -4,7 +4,6 @@
 #include <cerrno>
 #include <cstring>
 
-#include <sys/stat.h>
 #include <unistd.h>
 
 namespace qn::reader
@@ -24,6 +23,13 @@ file_source::file_source(const std::string &path, int folder)
     const int error = known ? (S_ISDIR(status.st_mode) ? EISDIR : EINVAL) : errno;
     close(descriptor_);
     throw io_error(error, known ? "is not a regular file" : "cannot be examined");
+}
+
+struct stat file_source::status() const
+{
+    struct stat status = {};
+    if (fstat(descriptor_, &status) != 0) throw io_error(errno, "cannot be examined");
+    return status;
 }
 
 file_source::~file_source() { close(descriptor_); }

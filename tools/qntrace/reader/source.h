@@ -12,6 +12,7 @@
 #include <vector>
 
 #include <fcntl.h>
+#include <sys/stat.h>
 
 namespace qn::reader
 {
@@ -45,6 +46,8 @@ public:
 
     std::uint64_t size() const override { return size_; }
     std::size_t read_at(std::uint64_t offset, std::span<std::byte> into) override;
+    // What the system says of the file now. Throws io_error.
+    struct stat status() const;
 
 private:
     int descriptor_ = -1;

@@ -15,6 +15,13 @@ namespace format = qn::tr::format;
 constexpr auto free_function = static_cast<std::uint16_t>(format::kind::free_space);
 constexpr auto unfinished_function = static_cast<std::uint16_t>(format::kind::being_written);
 
+bool has_body(const record_header &header)
+{
+    return header.function != free_function && header.function != unfinished_function;
+}
+
+} // namespace
+
 record_header parse_record_header(const byte_view &view)
 {
     record_header header;
@@ -29,21 +36,12 @@ record_header parse_record_header(const byte_view &view)
     return header;
 }
 
-// Whether the record has a number of its own; a filler has one when it closed off the end of the ring.
 bool is_numbered(const record_header &header)
 {
     return header.function != free_function || (header.seq != format::seq_filler && header.seq != 0);
 }
 
-bool has_body(const record_header &header)
-{
-    return header.function != free_function && header.function != unfinished_function;
-}
-
-// Sequence numbers wrap round; one is later than another when it is less than half the range ahead.
 bool later(std::uint32_t seq, std::uint32_t than) { return static_cast<std::int32_t>(seq - than) > 0; }
-
-} // namespace
 
 ring_walk::ring_walk(byte_source &source, window &file, const file_header &header, finding_sink report)
     : source_(source), file_(file), header_(header), report_(std::move(report))

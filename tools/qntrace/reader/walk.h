@@ -38,6 +38,13 @@ struct record_header {
     std::uint64_t counter = 0;
 };
 
+// Of at least as many bytes as a record header has.
+record_header parse_record_header(const byte_view &view);
+// Whether the record has a number of its own; a filler has one when it closed off the end of the ring.
+bool is_numbered(const record_header &header);
+// Sequence numbers wrap round; one is later than another when it is less than half the range ahead.
+bool later(std::uint32_t seq, std::uint32_t than);
+
 struct raw_record {
     std::uint64_t offset = 0;
     record_header header;

@@ -151,20 +151,6 @@ private:
         for (const auto &[number, page] : pages) examine(named_source(page));
     }
 
-    static std::map<std::uint32_t, std::string> pages_of(const std::string &path)
-    {
-        std::map<std::uint32_t, std::string> pages;
-        const fs::path base(path);
-        std::error_code error;
-        const fs::path folder = base.has_parent_path() ? base.parent_path() : fs::path(".");
-        for (fs::directory_iterator entry(folder, error), end; !error && entry != end; entry.increment(error)) {
-            const auto name = parse_page_name(entry->path().filename().string());
-            if (name && name->trace == base.filename())
-                pages.emplace(name->page, (base.parent_path() / entry->path().filename()).string());
-        }
-        return pages;
-    }
-
     // Opens a file for a first look.
     void examine(trace_source source)
     {
@@ -208,6 +194,20 @@ std::string trace_source::node() const
     if (!host.empty()) return host;
     if (!node_id.empty()) return node_id;
     return fmt::format("node{}", node_number);
+}
+
+std::map<std::uint32_t, std::string> pages_of(const std::string &path)
+{
+    std::map<std::uint32_t, std::string> pages;
+    const fs::path base(path);
+    std::error_code error;
+    const fs::path folder = base.has_parent_path() ? base.parent_path() : fs::path(".");
+    for (fs::directory_iterator entry(folder, error), end; !error && entry != end; entry.increment(error)) {
+        const auto name = parse_page_name(entry->path().filename().string());
+        if (name && name->trace == base.filename())
+            pages.emplace(name->page, (base.parent_path() / entry->path().filename()).string());
+    }
+    return pages;
 }
 
 trace_set find_traces(const std::vector<std::string> &arguments, duplicates choice)

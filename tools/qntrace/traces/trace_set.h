@@ -19,6 +19,7 @@
 #include <array>
 #include <cstdint>
 #include <ctime>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -71,6 +72,9 @@ struct trace_set {
 // Whether a life of a ring that several files hold is in the set once, or with every one of them. Who wants every file
 // also gets the pages whose header is broken, by their names; in a folder they are passed over otherwise.
 enum class duplicates { dropped, kept };
+
+// The pages of the trace of that name, by their numbers.
+std::map<std::uint32_t, std::string> pages_of(const std::string &trace);
 
 trace_set find_traces(const std::vector<std::string> &arguments, duplicates choice = duplicates::dropped);
 

@@ -1,0 +1,77 @@
+// A live trace by its name: the file of that name and the pages of its page set, whichever is written at the time,
+// across page switches, restarts of the program and files that take each other's place.
+//
+// Every ring has lives: the records since it was last started empty. A page is read to its end before the next one is
+// begun, and the next is the life that began first of those not read yet.
+#pragma once
+
+#include <chrono>
+#include <ctime>
+#include <map>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "tools/qntrace/follow/followed_file.h"
+#include "tools/qntrace/follow/ring_follower.h"
+
+namespace qn::dump
+{
+
+class trace_listener : public ring_listener
+{
+public:
+    // The records that follow are of this file.
+    virtual void entered(const std::string &path, const reader::file_header &header) = 0;
+    // What becomes of the files.
+    virtual void tell(const std::string &path, const std::string &what) = 0;
+    // Records are missing, and nobody can say how many.
+    virtual void tell_loss(const std::string &path, const std::string &what) = 0;
+};
+
+class trace_follower
+{
+public:
+    // The listener must outlive it. `coordinate`: writers wait for the reading of a single file.
+    trace_follower(std::string name, bool coordinate, trace_listener &to);
+    ~trace_follower();
+
+    // Hands out what there is, as much as lies together; false when there is nothing at the moment. Throws io_error for
+    // a file that is there and cannot be read.
+    bool advance();
+    // What there was at the beginning has been handed out.
+    bool caught_up() const;
+    // Whether some process has the file mapped that was read last. There is one that was read.
+    bool is_being_written() const;
+    bool has_file() const { return current_ != nullptr; }
+    // Looks at all files at the next advance(), also when that would not be due.
+    void look_at_all() { next_scan_ = {}; }
+    // Tells what is not complete.
+    void finish();
+
+private:
+    struct member;
+
+    void scan();
+    void open(const std::string &path, std::uint32_t page);
+    void renew(member &file);
+    bool step();
+    member *next_member();
+    bool has_unread_life(member &file) const;
+    bool has_news(member &file) const;
+    void enter(member &file);
+    void tell_pages_lost(const member &next);
+    void keep_writers_waiting();
+
+    std::string name_;
+    bool coordinate_;
+    trace_listener &to_;
+    std::map<std::string, std::unique_ptr<member>> members_;
+    member *current_ = nullptr;
+    bool started_ = false; // the first scan is done
+    bool waiting_told_ = false;
+    std::size_t to_catch_up_ = 0; // members of the first scan that were not entered yet
+    std::chrono::steady_clock::time_point next_scan_;
+};
+
+} // namespace qn::dump

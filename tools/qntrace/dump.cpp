@@ -12,6 +12,7 @@
 #include "tools/qntrace/console/output.h"
 #include "tools/qntrace/console/pager.h"
 #include "tools/qntrace/console/terminal.h"
+#include "tools/qntrace/follow/follow.h"
 #include "tools/qntrace/format/json.h"
 #include "tools/qntrace/format/text.h"
 #include "tools/qntrace/reader/reader.h"
@@ -34,6 +35,8 @@ struct dump_options {
     std::optional<std::size_t> last;
     std::shared_ptr<const selection> selected;
     std::vector<std::string> files;
+    bool follow = false;
+    follow_options following;
 };
 
 // Prints one file; `Format` is text_dump or json_dump.
@@ -97,6 +100,17 @@ void add_last_option(CLI::App &command, std::optional<std::size_t> &last)
         ->group("Selection");
 }
 
+int dump_and_follow(const dump_options &options)
+{
+    if (options.files.size() != 1) {
+        write_message("--follow takes one FILE");
+        return status_usage;
+    }
+    follow_options following = options.following;
+    following.output = {options.json, options.utc, options.colored, options.last, options.selected};
+    return follow(options.files[0], following);
+}
+
 int dump_files(const dump_options &options)
 {
     int worst = status_sound;
@@ -124,9 +138,18 @@ void add_dump_command(CLI::App &app, int &status)
     command->add_flag("--no-pager", options->no_pager, no_pager_help);
     options->selected = add_selection_options(*command);
     add_last_option(*command, options->last);
+    auto *follows = command
+                        ->add_flag("--follow", options->follow,
+                                   "Then go on with the records that are written from now on, as follow does")
+                        ->excludes("--raw");
+    add_follow_options(*command, options->following, follows);
     command->add_option("FILE", options->files, "Trace files: live ones, pages, or copies")->required();
     command->callback([options, &status] {
         options->colored = wants_color(options->color);
+        if (options->follow) {
+            status = dump_and_follow(*options);
+            return;
+        }
         const pager screen(!options->json && !options->no_pager);
         status = dump_files(*options);
     });

@@ -18,8 +18,8 @@ struct follow_options {
     std::chrono::nanoseconds interval = std::chrono::milliseconds(100);
 };
 
-// Adds --coordinate, --interval and --until-exit.
-void add_follow_options(CLI::App &command, follow_options &options);
+// Adds --coordinate, --interval and --until-exit; to a command that may follow, as what makes sense with `follows` only.
+void add_follow_options(CLI::App &command, follow_options &options, CLI::Option *follows = nullptr);
 
 // Follows until it is told to end. Returns the exit status.
 int follow(const std::string &name, const follow_options &options);

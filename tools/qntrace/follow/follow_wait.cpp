@@ -53,10 +53,8 @@ bool follow_wait::look(duration time)
     const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(time);
     const timespec timeout = {seconds.count(), (time - seconds).count()};
     pollfd out = {STDOUT_FILENO, 0, 0};
-    const int ready = ppoll(&out, 1, &timeout, &mask_before_);
-    if (end_asked_for != 0) return false;
-    // A pipe without a reader, a terminal that was closed.
-    return ready <= 0 || (out.revents & (POLLERR | POLLHUP)) == 0;
+    // Ready without being asked for anything: a pipe that nobody reads any more, a terminal that was closed.
+    return ppoll(&out, 1, &timeout, &mask_before_) <= 0 && end_asked_for == 0;
 }
 
 } // namespace qn::dump

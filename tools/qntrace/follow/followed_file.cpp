@@ -82,8 +82,7 @@ void writer_hold::store(std::uint32_t value)
     }
     struct stat status = {};
     const bool has_header = fstat(descriptor_, &status) == 0 && status.st_size >= off_t{format::header_bytes};
-    if (has_header && pwrite(descriptor_, word.data(), word.size(), offsetof(trace_file_header_t, uSeqLock)) < 0 &&
-        errno != EINTR)
+    if (!has_header || pwrite(descriptor_, word.data(), word.size(), offsetof(trace_file_header_t, uSeqLock)) < 0)
         held_.reset();
 }
 

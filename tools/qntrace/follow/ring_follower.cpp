@@ -29,6 +29,7 @@ ring_follower::ring_follower(reader::byte_source &source, const reader::file_hea
 ring_follower::progress ring_follower::advance(ring_listener &to)
 {
     const auto now = look_at_ring(source_, header_);
+    if (now && now->file_size != header_.file_size) return progress::new_life;
     const auto written = now ? written_to(*now) : std::nullopt;
     if (!written) return progress::nothing;
     if (!std::exchange(begun_, true)) {
@@ -307,6 +308,8 @@ void ring_follower::hand_out(const tile &at, ring_listener &to)
     record.body = std::move(decoded.body);
     record.problem = std::move(decoded.problem);
     time_base_.pass(record.body);
+    if (const auto *start = std::get_if<reader::start_body>(&record.body)) started_by_ = start->pid;
+    if (const auto *restart = std::get_if<reader::restart_body>(&record.body)) started_by_ = restart->start.pid;
     record.time = time_base_.time_of(at.header.counter);
     if (lost_) {
         lost_->behind = record.time;
@@ -332,7 +335,9 @@ void ring_follower::damaged(std::uint64_t offset, std::uint64_t end, ring_listen
 void ring_follower::finish(ring_listener &to)
 {
     if (lost_) to.lost(*std::exchange(lost_, std::nullopt));
-    if (!begun_ || lap_before_ || at_ >= written_to(seen_).value_or(at_)) return;
+    const auto now = look_at_ring(source_, header_);
+    const auto written = begun_ && now ? written_to(*now) : std::nullopt;
+    if (!written || started_anew(*now, *written) || lap_before_ || at_ >= *written) return;
     const auto newest = record_header_at(source_, header_, at_);
     if (!newest || !is_unfinished(*newest)) return;
     to.found(

@@ -66,7 +66,8 @@ public:
     // As advance() has seen it last.
     const ring_glance &seen() const { return seen_; }
     std::optional<std::uint32_t> last_seq() const { return last_seq_; }
-    const std::optional<timespec> &last_time() const { return last_time_; }
+    // The process that has written the last start record.
+    std::optional<std::uint32_t> started_by() const { return started_by_; }
 
 private:
     struct tile {
@@ -117,6 +118,7 @@ private:
     std::size_t usual_copy_bytes_ = 0;
     std::optional<std::uint32_t> last_seq_;
     std::optional<timespec> last_time_;
+    std::optional<std::uint32_t> started_by_;
     std::optional<lost_records> lost_; // not told yet
 };
 

@@ -33,7 +33,7 @@ std::optional<ring_glance> look_at_ring(reader::byte_source &source, const reade
         seen.time_info.timeinfo2 = view.u64(offsetof(trace_file_header_t, timeInfo) + 8);
         const bool inside = seen.oldest >= header.ring.begin && seen.oldest % 4 == 0 &&
                             seen.oldest + format::record_header_bytes <= header.ring.end;
-        if (inside) return seen;
+        if (inside || seen.file_size != header.file_size) return seen;
     }
     return std::nullopt;
 }

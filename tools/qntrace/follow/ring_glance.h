@@ -25,7 +25,7 @@ struct ring_glance {
 
 // What is found belongs together, also when the writer is at work: `first` is looked at before and behind the rest, and
 // was the same both times. Nothing when the file is too short, when the header names an oldest record where none can be
-// (a start is writing it), or when the writer comes round each time that it is looked.
+// in a file of that size (a start is writing it), or when the writer comes round each time that it is looked.
 std::optional<ring_glance> look_at_ring(reader::byte_source &source, const reader::file_header &header);
 
 // The record header at `offset`.

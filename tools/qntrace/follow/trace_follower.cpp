@@ -1,19 +1,23 @@
 #include "tools/qntrace/follow/trace_follower.h"
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
+#include <limits>
 #include <utility>
 #include <vector>
 
 #include <fmt/format.h>
 
 #include "tools/qntrace/traces/trace_set.h"
+#include "trace/files/format.h"
 
 namespace qn::dump
 {
 namespace
 {
 
+namespace format = qn::tr::format;
 using namespace std::chrono_literals;
 
 // How often it is looked for pages and for files that have taken another's place, while nothing happens.
@@ -27,20 +31,27 @@ std::optional<reader::file_header> header_of(followed_file &file)
     return reader::read_header(window, ignore);
 }
 
+// A file that a program has just made, and that it has not written to yet.
+bool is_being_made(followed_file &file)
+{
+    std::array<std::byte, 1> first = {};
+    return file.read_at(0, first) == 0 || first[0] == std::byte{0};
+}
+
 } // namespace
 
 struct trace_follower::member {
     std::string path;
     std::uint32_t page = 0; // 0: the file of the trace's own name
     std::unique_ptr<followed_file> file;
-    std::optional<reader::file_header> header; // as it was found when the file was opened
-    std::unique_ptr<ring_follower> ring;       // of the life that was read last
     std::unique_ptr<writer_hold> hold;
-    bool new_life = false;  // the ring has begun a life that was not entered yet
-    bool was_empty = false; // when it was looked at first
+    std::optional<reader::file_header> header; // as the last scan has found it
+    std::unique_ptr<ring_follower> ring;       // of the life that was read last
+    bool new_life = false;                     // the ring has begun a life that was not entered yet
+    bool seen_empty = false;                   // so that its next life begins with the first record
+    bool there_at_start = false;               // with records that were not begun to be read yet
     bool gone_told = false;
     bool cut_told = false;
-    std::optional<timespec> life_began;
 };
 
 trace_follower::trace_follower(std::string name, bool coordinate, trace_listener &to)
@@ -52,12 +63,20 @@ trace_follower::~trace_follower() = default;
 
 bool trace_follower::caught_up() const
 {
-    return started_ && to_catch_up_ == 0 && (current_ == nullptr || current_->ring->caught_up());
+    return started_ && (current_ == nullptr || current_->ring->caught_up()) &&
+           std::none_of(members_.begin(), members_.end(), [](const auto &file) { return file.second->there_at_start; });
 }
 
 bool trace_follower::is_being_written() const
 {
-    return current_ != nullptr && current_->file->is_mapped_by(current_->ring->seen().pid);
+    if (current_ != nullptr) {
+        if (current_->file->is_mapped_by(current_->ring->seen().pid)) return true;
+        const auto started_by = current_->ring->started_by();
+        if (started_by && current_->file->is_mapped_by(*started_by)) return true;
+    }
+    return std::any_of(members_.begin(), members_.end(), [](const auto &file) {
+        return file.second->header && file.second->file->is_mapped_by(file.second->header->pid);
+    });
 }
 
 bool trace_follower::advance()
@@ -68,9 +87,12 @@ bool trace_follower::advance()
     if (!due) return false;
     next_scan_ = now + scan_interval;
     scan();
-    member *next = next_member();
-    if (next == nullptr) return false;
-    if (next != current_ || next->new_life) enter(*next);
+    const auto next = next_life();
+    if (next.file == nullptr) {
+        for (const auto &[path, file] : members_) file->there_at_start = false;
+        return false;
+    }
+    if (next.file != current_ || next.unread) enter(next);
     return step();
 }
 
@@ -79,14 +101,9 @@ bool trace_follower::step()
     if (current_->new_life) return false;
     const auto done = current_->ring->advance(to_);
     if (done == ring_follower::progress::new_life) current_->new_life = true;
-    keep_writers_waiting();
-    return done == ring_follower::progress::some;
-}
-
-void trace_follower::keep_writers_waiting()
-{
     const auto last = current_->ring->last_seq();
     if (current_->hold != nullptr && last) current_->hold->hold(*last + 2, current_->ring->header().order);
+    return done == ring_follower::progress::some;
 }
 
 void trace_follower::scan()
@@ -101,14 +118,8 @@ void trace_follower::scan()
         else
             renew(*known->second);
     }
-    if (!started_) {
-        for (const auto &[path, file] : members_) to_catch_up_ += has_unread_life(*file) ? 1 : 0;
-        started_ = true;
-    }
-    if (members_.empty() && !waiting_told_) {
-        waiting_told_ = true;
-        to_.tell(name_, "there is no such trace; waiting for it");
-    }
+    if (std::exchange(started_, true)) return;
+    if (members_.empty()) throw reader::io_error(ENOENT, "cannot be opened");
 }
 
 void trace_follower::open(const std::string &path, std::uint32_t page)
@@ -124,12 +135,13 @@ void trace_follower::open(const std::string &path, std::uint32_t page)
         throw;
     }
     file->header = header_of(*file->file);
-    file->was_empty = started_ || !file->header || !has_unread_life(*file);
-    if (!file->header && !started_) to_.tell(path, "is no trace file; waiting until it is one");
+    if (!file->header && !started_ && !is_being_made(*file->file)) throw not_a_trace();
+    file->there_at_start = !started_ && has_unread_life(*file);
+    file->seen_empty = !file->there_at_start;
     members_.emplace(path, std::move(file));
 }
 
-// Looks whether the name still stands for the file, and whether the file is a trace file by now.
+// Looks whether the name still stands for the file, and what is in it.
 void trace_follower::renew(member &file)
 {
     const auto there = file.file->is_at(file.path);
@@ -137,101 +149,107 @@ void trace_follower::renew(member &file)
         if (!file.gone_told) to_.tell(file.path, "was removed; waiting for a new one");
         file.gone_told = true;
     } else if (!*there) {
+        if (&file == current_) leave();
         to_.tell(file.path, "was replaced by a new file");
-        if (&file == current_) {
-            file.ring->finish(to_);
-            current_ = nullptr;
-        }
         const std::string path = file.path;
         const std::uint32_t page = file.page;
         members_.erase(path);
         open(path, page);
         return;
     }
-    if (!file.header) file.header = header_of(*file.file);
-    if (!file.header) return;
-    const bool cut = file.file->size() < file.header->ring.end;
+    file.header = header_of(*file.file);
+    const bool cut = file.header && file.file->size() < file.header->file_size;
     if (cut && !file.cut_told) to_.tell_loss(file.path, fmt::format("was cut to {} bytes", file.file->size()));
     file.cut_told = cut;
 }
 
 // A life that holds records, and of which none was handed out.
-bool trace_follower::has_unread_life(member &file) const
+bool trace_follower::has_unread_life(const member &file) const
 {
-    if (!file.header) return false;
-    const auto now = look_at_ring(*file.file, *file.header);
+    const auto now = file.header ? look_at_ring(*file.file, *file.header) : std::nullopt;
     if (!now || (is_free(now->first) && !reader::is_numbered(now->first))) return false;
-    const reader::current_time_base base(now->time_info);
-    file.life_began = base.time_of(now->first.counter);
     return file.ring == nullptr || file.new_life || (file.page != 0 && !same_lap(file.ring->seen().first, now->first));
 }
 
 // Records in the life that was read before, which nobody wrote to when it was left.
-bool trace_follower::has_news(member &file) const
+bool trace_follower::has_news(const member &file) const
 {
     if (&file == current_ || file.ring == nullptr || !file.header) return false;
     const auto now = look_at_ring(*file.file, *file.header);
     return now && (now->oldest != file.ring->seen().oldest || !same_lap(file.ring->seen().first, now->first));
 }
 
-trace_follower::member *trace_follower::next_member()
+// When the first record of the file was written. One that is being written now comes behind all others.
+trace_follower::moment trace_follower::beginning_of(const member &file)
 {
-    member *first = nullptr;
-    for (const auto &[path, file] : members_) {
-        if (!has_unread_life(*file)) continue;
-        const auto time = [](const member &of) {
-            const timespec began = of.life_began.value_or(timespec{});
-            return std::pair(began.tv_sec, began.tv_nsec);
-        };
-        if (first == nullptr || time(*file) < time(*first)) first = file.get();
-    }
-    if (first != nullptr) return first;
-    for (const auto &[path, file] : members_)
-        if (has_news(*file)) return file.get();
-    return nullptr;
+    const auto first = record_header_at(*file.file, *file.header, file.header->ring.begin);
+    if (!first || is_unfinished(*first)) return {std::numeric_limits<std::time_t>::max(), 0};
+    const auto time = reader::current_time_base(file.header->time_info).time_of(first->counter).value_or(timespec{});
+    return {time.tv_sec, time.tv_nsec};
 }
 
-void trace_follower::enter(member &file)
+trace_follower::life trace_follower::next_life() const
 {
-    const bool unread_life = has_unread_life(file);
-    if (current_ != nullptr && current_->ring != nullptr) {
-        current_->ring->finish(to_);
-        if (unread_life) tell_pages_lost(file);
+    life next;
+    moment earliest;
+    for (const auto &[path, file] : members_) {
+        if (!has_unread_life(*file)) continue;
+        const auto began = beginning_of(*file);
+        if (next.file != nullptr && began >= earliest) continue;
+        next = {file.get(), true};
+        earliest = began;
     }
-    if (unread_life) {
-        const auto header = header_of(*file.file);
-        if (!header) return;
+    if (next.file != nullptr) return next;
+    for (const auto &[path, file] : members_)
+        if (has_news(*file)) return {file.get(), false};
+    return {};
+}
+
+void trace_follower::enter(const life &next)
+{
+    member &file = *next.file;
+    member *before = current_;
+    if (before != nullptr) leave();
+    if (next.unread) {
+        if (before != nullptr) tell_pages_lost(*before, file);
         if (file.page == 0 && file.new_life) to_.tell(file.path, "was started anew");
-        file.header = header;
-        file.ring = std::make_unique<ring_follower>(*file.file, *header, file.was_empty || file.new_life);
+        file.ring = std::make_unique<ring_follower>(*file.file, *file.header, file.seen_empty);
         file.new_life = false;
-        file.was_empty = true; // from now on no life begins unseen
-        if (to_catch_up_ != 0) --to_catch_up_;
+        file.seen_empty = true; // from now on no life begins unseen
+        file.there_at_start = false;
     }
     current_ = &file;
     to_.entered(file.path, file.ring->header());
 }
 
+// Hands out what is left, of a file that is not written any more, or that somebody goes on writing without its name.
+void trace_follower::leave()
+{
+    const auto &ring = current_->ring->header().ring;
+    for (auto most = (ring.end - ring.begin) / format::record_header_bytes; most != 0 && step(); --most) {
+    }
+    current_->ring->finish(to_);
+    current_ = nullptr;
+}
+
 // Pages are written in the order of their numbers, but for those that are being copied just then. So the next life is the
 // first unread one in that order, unless pages were overwritten.
-void trace_follower::tell_pages_lost(const member &next)
+void trace_follower::tell_pages_lost(const member &before, const member &next)
 {
-    if (current_->page == 0 || next.page == 0) return;
-    if (current_->new_life && !current_->ring->finished()) {
-        to_.tell_loss(current_->path, "the page was overwritten before it was read to its end");
+    if (before.page == 0 || next.page == 0) return;
+    if (before.new_life && !before.ring->finished()) {
+        to_.tell_loss(before.path, "the page was overwritten before it was read to its end");
         return;
     }
-    std::vector<member *> pages;
+    std::vector<const member *> pages;
     for (const auto &[path, file] : members_)
         if (file->page != 0) pages.push_back(file.get());
     std::sort(pages.begin(), pages.end(), [](const auto *left, const auto *right) { return left->page < right->page; });
-    const auto here = std::find(pages.begin(), pages.end(), current_);
+    const auto here = std::find(pages.begin(), pages.end(), &before);
     std::rotate(pages.begin(), here + 1, pages.end());
-    std::size_t overwritten = 0;
-    for (member *page : pages) {
-        if (page == &next) break;
-        overwritten += has_unread_life(*page) ? 1 : 0;
-    }
+    const auto behind = std::find(pages.begin(), pages.end(), &next);
+    const auto overwritten =
+        std::count_if(pages.begin(), behind, [this](const member *page) { return has_unread_life(*page); });
     if (overwritten == 0) return;
     to_.tell_loss(next.path,
                   fmt::format("at least {} {} overwritten before {} read", overwritten,

@@ -9,8 +9,9 @@
 #include <ctime>
 #include <map>
 #include <memory>
-#include <optional>
+#include <stdexcept>
 #include <string>
+#include <utility>
 
 #include "tools/qntrace/follow/followed_file.h"
 #include "tools/qntrace/follow/ring_follower.h"
@@ -29,6 +30,13 @@ public:
     virtual void tell_loss(const std::string &path, const std::string &what) = 0;
 };
 
+// The file is there, but it is of another kind.
+class not_a_trace : public std::runtime_error
+{
+public:
+    not_a_trace() : std::runtime_error("not a trace file: its header makes no sense") {}
+};
+
 class trace_follower
 {
 public:
@@ -37,13 +45,12 @@ public:
     ~trace_follower();
 
     // Hands out what there is, as much as lies together; false when there is nothing at the moment. Throws io_error for
-    // a file that is there and cannot be read.
+    // a file that cannot be read, or when there is none at first; not_a_trace when it is none at first.
     bool advance();
     // What there was at the beginning has been handed out.
     bool caught_up() const;
-    // Whether some process has the file mapped that was read last. There is one that was read.
+    // Whether the process that writes the trace has it mapped.
     bool is_being_written() const;
-    bool has_file() const { return current_ != nullptr; }
     // Looks at all files at the next advance(), also when that would not be due.
     void look_at_all() { next_scan_ = {}; }
     // Tells what is not complete.
@@ -51,17 +58,24 @@ public:
 
 private:
     struct member;
+    // What is to be read next.
+    struct life {
+        member *file = nullptr; // null: nothing
+        bool unread = false;    // from its beginning; otherwise it was begun already
+    };
+    using moment = std::pair<std::time_t, long>;
 
+    bool step();
     void scan();
     void open(const std::string &path, std::uint32_t page);
     void renew(member &file);
-    bool step();
-    member *next_member();
-    bool has_unread_life(member &file) const;
-    bool has_news(member &file) const;
-    void enter(member &file);
-    void tell_pages_lost(const member &next);
-    void keep_writers_waiting();
+    bool has_unread_life(const member &file) const;
+    bool has_news(const member &file) const;
+    static moment beginning_of(const member &file);
+    life next_life() const;
+    void enter(const life &next);
+    void leave();
+    void tell_pages_lost(const member &before, const member &next);
 
     std::string name_;
     bool coordinate_;
@@ -69,8 +83,6 @@ private:
     std::map<std::string, std::unique_ptr<member>> members_;
     member *current_ = nullptr;
     bool started_ = false; // the first scan is done
-    bool waiting_told_ = false;
-    std::size_t to_catch_up_ = 0; // members of the first scan that were not entered yet
     std::chrono::steady_clock::time_point next_scan_;
 };
 

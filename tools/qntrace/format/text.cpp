@@ -2,6 +2,7 @@
 
 #include <cstdlib>
 
+#include <fmt/compile.h>
 #include <fmt/format.h>
 
 #include "tools/qntrace/format/body.h"
@@ -123,7 +124,7 @@ void text_dump::record(std::string &out, const reader::trace_record &record)
                header.reserved, header.counter);
     }
     time_column(out, record);
-    append(out, "  {:>8}  {:#010x}  ", header.seq, header.thread);
+    fmt::format_to(std::back_inserter(out), FMT_COMPILE("  {:>8}  {:#010x}  "), header.seq, header.thread);
     component_column(out, header);
     out += "  ";
     kind_and_body(out, record);
@@ -146,12 +147,14 @@ void text_dump::kind_and_body(std::string &out, const reader::trace_record &reco
 
 void text_dump::time_column(std::string &out, const reader::trace_record &record)
 {
-    std::string text = "-";
-    if (!std::holds_alternative<reader::free_body>(record.body)) {
-        const auto time = record.time ? timestamps_.text(*record.time) : std::nullopt;
-        text = time ? *time : fmt::format("counter {}", record.raw.header.counter);
+    const auto begin = out.size();
+    if (std::holds_alternative<reader::free_body>(record.body)) {
+        out += '-';
+    } else if (!record.time || !timestamps_.append(out, *record.time)) {
+        append(out, "counter {}", record.raw.header.counter);
     }
-    append(out, "{:<{}}", text, timestamps_.width());
+    const auto width = out.size() - begin;
+    if (width < timestamps_.width()) out.append(timestamps_.width() - width, ' ');
 }
 
 void text_dump::component_column(std::string &out, const reader::record_header &header) const

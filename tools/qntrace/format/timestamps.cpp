@@ -2,6 +2,7 @@
 
 #include <cstdlib>
 
+#include <fmt/compile.h>
 #include <fmt/format.h>
 
 namespace qn::dump
@@ -33,17 +34,27 @@ bool timestamps::break_down(time_t second)
     return true;
 }
 
-std::optional<std::string> timestamps::text(const timespec &time)
+bool timestamps::append(std::string &out, const timespec &time)
 {
     // Far outside the years that can be written, and safe to add a zone to.
     constexpr time_t limit = time_t{1} << 50;
-    if (time.tv_sec < -limit || time.tv_sec > limit) return std::nullopt;
+    if (time.tv_sec < -limit || time.tv_sec > limit) return false;
     if (second_ != time.tv_sec) {
         writable_ = break_down(time.tv_sec);
         second_ = time.tv_sec;
     }
-    if (!writable_) return std::nullopt;
-    return fmt::format("{}.{:09}{}", prefix_, time.tv_nsec, suffix_);
+    if (!writable_) return false;
+    out += prefix_;
+    fmt::format_to(std::back_inserter(out), FMT_COMPILE(".{:09}"), time.tv_nsec);
+    out += suffix_;
+    return true;
+}
+
+std::optional<std::string> timestamps::text(const timespec &time)
+{
+    std::string text;
+    if (!append(text, time)) return std::nullopt;
+    return text;
 }
 
 std::size_t timestamps::width() const

@@ -17,6 +17,8 @@ public:
 
     // Nothing for a year that RFC 3339 cannot write, that is outside 0000 to 9999.
     std::optional<std::string> text(const timespec &time);
+    // The same behind `out`; false, and nothing, for such a year.
+    bool append(std::string &out, const timespec &time);
     // Width of a text.
     std::size_t width() const;
 

@@ -251,5 +251,31 @@ TEST(RingFollower, TellsThatTheRingWasStartedAnew)
     EXPECT_EQ(ring.advance(seen), ring_follower::progress::new_life);
 }
 
+// Takes whatever is handed out.
+struct any_listener final : dump::ring_listener {
+    void record(const reader::trace_record &) override {}
+    void lost(const dump::lost_records &) override {}
+    void found(const reader::finding &) override {}
+};
+
+TEST(RingFollower, ComesToAnEndWhateverTheBytesAre)
+{
+    std::mt19937 random(20261121);
+    const auto past = small_ring(400, 40);
+    for (int run = 0; run < 20000; ++run) {
+        const std::size_t moment = random() % past.moments.size();
+        auto bytes = past.moments[moment];
+        const auto header = header_of(past, moment);
+        for (unsigned changes = 1 + random() % 20; changes != 0; --changes)
+            bytes[random() % 8 == 0 ? 44 + random() % 4 : 200 + random() % 400] = std::byte(random() % 256);
+        reader::memory_source source(bytes);
+        any_listener nobody;
+        ring_follower ring(source, header, false);
+        int rounds = 0;
+        while (ring.advance(nobody) == ring_follower::progress::some) ASSERT_LT(++rounds, 1000) << "run " << run;
+        ring.finish(nobody);
+    }
+}
+
 } // namespace
 } // namespace qn::test

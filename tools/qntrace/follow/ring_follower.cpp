@@ -29,13 +29,19 @@ ring_follower::ring_follower(reader::byte_source &source, const reader::file_hea
 ring_follower::progress ring_follower::advance(ring_listener &to)
 {
     const auto now = look_at_ring(source_, header_);
-    if (now && now->file_size != header_.file_size) return progress::new_life;
-    const auto written = now ? written_to(*now) : std::nullopt;
+    if (!now) return progress::nothing;
+    if (now->file_size != header_.file_size || (begun_ && now->is_empty())) return progress::new_life;
+    if (now->is_empty()) {
+        since_start_ = caught_up_ = true;
+        return progress::nothing;
+    }
+    const auto written = written_to(*now);
     if (!written) return progress::nothing;
     if (!std::exchange(begun_, true)) {
+        const bool was_empty = caught_up_;
         start_over(*now, *written);
         target_ = *written;
-        caught_up_ = false;
+        caught_up_ = was_empty;
     } else if (started_anew(*now, *written)) {
         return progress::new_life;
     } else if (!is_in_reach(*now, *written)) {
@@ -90,10 +96,10 @@ std::optional<std::uint64_t> ring_follower::written_behind(const ring_glance &un
 // Numbers only grow while a ring is continued, and a page is written once from its start to its end.
 bool ring_follower::started_anew(const ring_glance &now, std::uint64_t written) const
 {
-    if (now.file_size != header_.file_size || (seen_.is_full_page() && !now.is_full_page())) return true;
+    if (now.file_size != header_.file_size || now.is_empty()) return true;
+    if (seen_.is_full_page() && !now.is_full_page()) return true;
     if (same_lap(seen_.first, now.first)) return now.page_state != 0 && !lap_before_ && written < at_;
     if (now.page_state != 0 && seen_.first.seq != 0) return true;
-    if (is_free(now.first) && !reader::is_numbered(now.first)) return !is_free(seen_.first);
     return !reader::later(now.first.seq, last_seq_.value_or(seen_.first.seq));
 }
 
@@ -137,7 +143,6 @@ void ring_follower::start_over(const ring_glance &now, std::uint64_t written)
     usual_copy_bytes_ = first_copy_bytes;
     caught_up_ = true;
     time_base_ = reader::current_time_base(now.time_info);
-    if (!last_seq_ && is_free(now.first) && now.first.seq == 0) last_seq_ = 0;
 }
 
 void ring_follower::see(const ring_glance &now, std::uint64_t written)
@@ -155,6 +160,10 @@ ring_follower::progress ring_follower::read_on(std::uint64_t written, ring_liste
     // What was there at the beginning is handed out by itself.
     const std::uint64_t stop = !lap_before_ && !caught_up_ ? std::min(end, target_) : end;
     const bool newest_at_end = !lap_before_ && !seen_.is_full_page();
+    if (end - at_ < format::record_header_bytes) {
+        damaged(at_, end, to);
+        return progress::some;
+    }
     if (!copy(end)) return progress::nothing;
     if (!lap_before_) copy_newest_again(end);
     const auto touched = look_what_is_touched();
@@ -213,12 +222,16 @@ void ring_follower::copy_newest_again(std::uint64_t end)
     }
 }
 
+reader::record_header ring_follower::header_in_copy(std::uint64_t offset) const
+{
+    const auto bytes = std::span(copied_).subspan(static_cast<std::size_t>(offset - copied_from_));
+    return reader::parse_record_header(reader::byte_view(bytes.first(format::record_header_bytes), header_.order));
+}
+
 // Of the copy; nothing when its length cannot be right.
 std::optional<ring_follower::tile> ring_follower::tile_at(std::uint64_t offset, std::uint64_t end) const
 {
-    const reader::byte_view view(copied_, header_.order);
-    const auto header = reader::parse_record_header(
-        reader::byte_view(view.part(offset - copied_from_, format::record_header_bytes), header_.order));
+    const auto header = header_in_copy(offset);
     const bool sound =
         header.length >= format::record_header_bytes && header.length % 4 == 0 && header.length <= end - offset;
     if (!sound) return std::nullopt;
@@ -249,9 +262,9 @@ std::optional<ring_follower::touched_part> ring_follower::look_what_is_touched()
     const auto first = record_header_at(source_, header_, header_.ring.begin);
     if (!oldest || !first || !same_lap(now->first, *first)) return std::nullopt;
     if (at_ == *written) {
-        const auto copied = tile_at(at_, header_.ring.end);
-        const bool same = copied && copied->header.seq == oldest->seq && copied->header.function == oldest->function &&
-                          copied->header.length == oldest->length;
+        const auto copied = header_in_copy(at_);
+        const bool same =
+            copied.seq == oldest->seq && copied.function == oldest->function && copied.length == oldest->length;
         if (same) return touched_part{*written, *written};
     }
     const bool taken = reader::is_numbered(*oldest) && !reader::later(now->first.seq, oldest->seq);

@@ -89,6 +89,7 @@ private:
     progress read_on(std::uint64_t written, ring_listener &to);
     bool copy(std::uint64_t end);
     void copy_newest_again(std::uint64_t end);
+    reader::record_header header_in_copy(std::uint64_t offset) const;
     std::optional<tile> tile_at(std::uint64_t offset, std::uint64_t end) const;
     bool is_cut_off(const tile &at) const;
     std::optional<touched_part> look_what_is_touched();

@@ -9,7 +9,16 @@ namespace
 
 namespace format = qn::tr::format;
 
+// At the start of the ring.
+bool fits(const reader::record_header &first, const reader::file_header &header)
+{
+    return first.length >= format::record_header_bytes && first.length % 4 == 0 &&
+           first.length <= header.ring.end - header.ring.begin;
+}
+
 } // namespace
+
+bool ring_glance::is_empty() const { return first.seq == 0 && (is_free(first) || is_unfinished(first)); }
 
 bool ring_glance::is_full_page() const { return page_state != 0 && page_state != format::page_state::active; }
 
@@ -19,7 +28,7 @@ std::optional<ring_glance> look_at_ring(reader::byte_source &source, const reade
     for (unsigned looks = 0; looks < most_looks; ++looks) {
         const auto first = record_header_at(source, header, header.ring.begin);
         std::array<std::byte, format::header_bytes> bytes;
-        if (!first || source.read_at(0, bytes) < bytes.size()) return std::nullopt;
+        if (!first || !fits(*first, header) || source.read_at(0, bytes) < bytes.size()) return std::nullopt;
         const auto first_again = record_header_at(source, header, header.ring.begin);
         if (!first_again || !same_lap(*first, *first_again)) continue;
         const reader::byte_view view(bytes, header.order);

@@ -19,13 +19,15 @@ struct ring_glance {
     std::uint8_t page_state = 0;
     cu_timeinfo_t time_info = {};
 
+    // Nobody has written a record since the ring was made, or started anew, which may be going on just now.
+    bool is_empty() const;
     // A page that is not written any more.
     bool is_full_page() const;
 };
 
 // What is found belongs together, also when the writer is at work: `first` is looked at before and behind the rest, and
-// was the same both times. Nothing when the file is too short, when the header names an oldest record where none can be
-// in a file of that size (a start is writing it), or when the writer comes round each time that it is looked.
+// was the same both times. Nothing when the writer comes round each time that it is looked; and when the file is too short
+// or when the oldest or the first record make no sense, because a start is writing them, or for damage.
 std::optional<ring_glance> look_at_ring(reader::byte_source &source, const reader::file_header &header);
 
 // The record header at `offset`.

@@ -167,7 +167,7 @@ void trace_follower::renew(member &file)
 bool trace_follower::has_unread_life(const member &file) const
 {
     const auto now = file.header ? look_at_ring(*file.file, *file.header) : std::nullopt;
-    if (!now || (is_free(now->first) && !reader::is_numbered(now->first))) return false;
+    if (!now || now->is_empty()) return false;
     return file.ring == nullptr || file.new_life || (file.page != 0 && !same_lap(file.ring->seen().first, now->first));
 }
 
@@ -259,6 +259,9 @@ void trace_follower::tell_pages_lost(const member &before, const member &next)
 void trace_follower::finish()
 {
     if (current_ != nullptr) current_->ring->finish(to_);
+    for (const auto &[path, file] : members_)
+        if (file->ring == nullptr && file->header && !look_at_ring(*file->file, *file->header))
+            to_.tell_loss(path, "cannot be followed: the oldest record, or the first one in the file, makes no sense");
 }
 
 } // namespace qn::dump

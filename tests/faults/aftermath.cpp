@@ -1,0 +1,158 @@
+#include "faults/aftermath.h"
+
+#include <algorithm>
+#include <csignal>
+#include <cstdlib>
+#include <cstring>
+#include <dirent.h>
+#include <fstream>
+#include <new>
+#include <sys/mman.h>
+#include <sys/wait.h>
+#include <thread>
+#include <unistd.h>
+
+#include <gtest/gtest.h>
+
+#include "support/last_error.h"
+#include "support/scratch.h"
+#include "trace/trace.h"
+
+namespace
+{
+using namespace qn::test;
+
+constexpr unsigned longest_seconds = 60; // a process that takes longer hangs
+
+bool is_free(pthread_mutex_t &mutex)
+{
+    bool free = false;
+    std::thread([&] {
+        free = pthread_mutex_trylock(&mutex) == 0;
+        if (free) pthread_mutex_unlock(&mutex);
+    }).join();
+    return free;
+}
+
+// The spool thread holds the queue mutex while it works; that passes.
+bool gets_free(pthread_mutex_t &mutex)
+{
+    for (int tries = 0; tries < 2000; ++tries) {
+        if (is_free(mutex)) return true;
+        usleep(1000);
+    }
+    return false;
+}
+
+const char *held_lock()
+{
+    if (!is_free(anchor_list_mutex)) return "anchor list";
+    if (!is_free(component_list_mutex)) return "component list";
+    if (!is_free(configuration_file_last_modified_mutex)) return "configuration time";
+    if (!is_free(cluster_info_mutex)) return "cluster info";
+    if (!gets_free(spq.mutex)) return "spool queue";
+    for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = anchor->next) {
+        if (!gets_free(anchor->anchorMutex)) return anchor == &anchors ? "global" : "trace file";
+        if (anchor->pSpoolMutex != nullptr && !gets_free(*anchor->pSpoolMutex)) return "page set";
+    }
+    return "";
+}
+
+uint64_t open_descriptors()
+{
+    uint64_t count = 0;
+    DIR *directory = opendir("/proc/self/fd");
+    while (directory != nullptr && readdir(directory) != nullptr) ++count;
+    closedir(directory);
+    return count;
+}
+
+uint64_t mappings_of(const std::string &folder)
+{
+    std::ifstream maps("/proc/self/maps");
+    uint64_t count = 0;
+    for (std::string line; std::getline(maps, line);) count += line.find(folder) != std::string::npos;
+    return count;
+}
+
+void tell_error(aftermath &told)
+{
+    const error_seen seen = last_error();
+    told.recorded = seen.code;
+    std::strncpy(told.message, seen.text.c_str(), sizeof told.message - 1);
+}
+} // namespace
+
+namespace qn::test
+{
+std::string aftermath::how_it_ended() const
+{
+    static constexpr const char *stages[] = {"while it prepared", "in the attacked call", "in the call made again",
+                                             "at its end", "in the end"};
+    std::string text = WIFSIGNALED(ended_by) ? std::string("killed by ") + strsignal(WTERMSIG(ended_by))
+                                             : "exit status " + std::to_string(WEXITSTATUS(ended_by));
+    return text + " " + stages[stage];
+}
+
+void play(const attacked_call &call, const attack &attack, const std::string &folder, aftermath &told)
+{
+    alarm(longest_seconds);
+    const uint64_t allocations_of_test = attack.allocations();
+    call.prepare(folder);
+    leave_marker();
+    last_error(); // the first message of a process loads what the C library needs for it
+    told.stage = aftermath::prepared;
+    attack.begin();
+    told.status = call.call(folder);
+    told.faults = attack.end();
+
+    tell_error(told);
+    if (call.keeps_global_mutex && told.status != 0) unlockGlobalMutex();
+    std::strncpy(told.held_lock, held_lock(), sizeof told.held_lock - 1);
+    told.stage = aftermath::attacked;
+    call.undo(folder);
+
+    told.status_again = call.call(folder);
+    told.stage = aftermath::repeated;
+    call.undo(folder);
+    told.allocations = attack.allocations() - allocations_of_test;
+    told.descriptors = open_descriptors();
+    told.mappings = mappings_of(folder);
+    told.stage = aftermath::ended;
+    _exit(0);
+}
+
+aftermath play_in_child(const attacked_call &call, const attack &attack)
+{
+    const scratch folder;
+    const shared_aftermath told;
+    const pid_t child = fork();
+    if (child == 0) play(call, attack, folder.folder(), *told);
+    waitpid(child, &told->ended_by, 0);
+    return *told;
+}
+
+shared_aftermath::shared_aftermath()
+{
+    void *memory = mmap(nullptr, sizeof(aftermath), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
+    if (memory == MAP_FAILED) std::abort();
+    told_ = new (memory) aftermath;
+}
+shared_aftermath::~shared_aftermath() { munmap(told_, sizeof *told_); }
+
+void expect_no_harm(const attacked_call &call, const aftermath &told, const aftermath &undisturbed)
+{
+    ASSERT_EQ(told.stage, aftermath::ended) << told.how_it_ended();
+    ASSERT_EQ(told.ended_by, 0) << told.how_it_ended();
+    const bool known = told.status == undisturbed.status ||
+                       std::find(call.codes.begin(), call.codes.end(), told.status) != call.codes.end();
+    EXPECT_TRUE(known) << "returned " << told.status << ": " << told.message;
+    EXPECT_TRUE(!call.records_its_code || told.recorded == told.status)
+        << "returned " << told.status << ", recorded " << told.recorded << ": " << told.message;
+    EXPECT_STREQ(told.held_lock, "") << "is held behind the call";
+    EXPECT_EQ(told.status_again, undisturbed.status_again) << "the same call again";
+    EXPECT_LE(told.allocations, undisturbed.allocations) << "memory is lost";
+    EXPECT_LE(told.descriptors, undisturbed.descriptors) << "descriptors are left open";
+    EXPECT_LE(told.mappings, undisturbed.mappings) << "files are left mapped";
+}
+} // namespace qn::test

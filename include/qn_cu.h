@@ -232,10 +232,11 @@ QN_EXPORT int cu_get_node_id_1(qn_uint64_t *node_id);
 QN_EXPORT int cu_get_proc_args_1(pid_t pid, char *buffer, size_t size);
 
 /*
- * Stores in *gid the number of the group "qnadm", whose members administer the software family.
+ * Stores in *gid the number of the group "qnadm", whose members administer the software family. It is a group of
+ * the machine, in /etc/group.
  *
- * Returns 0; EINVAL when gid is null; ENOENT when there is no such group; otherwise the error of the group
- * database or ENOMEM.
+ * Returns 0; EINVAL when gid is null; ENOENT when there is no such group; otherwise the error of opening or
+ * reading that file.
  */
 QN_EXPORT int cu_getadmin_group_id_1(gid_t *gid);
 

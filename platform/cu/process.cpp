@@ -3,10 +3,11 @@
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
-#include <grp.h>
+#include <cstdlib>
+#include <cstring>
+#include <limits>
 #include <memory>
-#include <new>
-#include <span>
+#include <string_view>
 
 #include <qn_cu.h>
 
@@ -16,21 +17,39 @@ namespace qn::cu
 {
 namespace
 {
-constexpr const char *admin_group = "qnadm";
-constexpr size_t first_group_bytes = 1024;
-constexpr size_t most_group_bytes = 16 << 20; // a group with a great many members
+// The machine's own groups, and not getgrnam_r(): that loads the modules of /etc/nsswitch.conf into the program, may
+// wait for a server on the network, and kills the program where memory runs out in it.
+constexpr const char *group_file = "/etc/group";
+constexpr std::string_view admin_group = "qnadm:"; // how its line begins
 
-int find_group(const char *name, std::span<char> scratch, gid_t *gid)
+struct close_stream {
+    void operator()(FILE *stream) const { std::fclose(stream); }
+};
+
+// Reads the number behind "name:password:".
+bool number_in(const char *line, gid_t *gid)
 {
-    group entry;
-    group *found = nullptr;
-    int error;
-    do error = getgrnam_r(name, &entry, scratch.data(), scratch.size(), &found);
-    while (error == EINTR);
-    if (error != 0) return error;
-    if (found == nullptr) return ENOENT;
-    *gid = found->gr_gid;
-    return 0;
+    const char *number = std::strchr(line + admin_group.size(), ':');
+    if (number == nullptr) return false;
+    char *end = nullptr;
+    const unsigned long value = std::strtoul(++number, &end, 10);
+    if (end == number || *end != ':' || value > std::numeric_limits<gid_t>::max()) return false;
+    *gid = static_cast<gid_t>(value);
+    return true;
+}
+
+int find_admin_group(gid_t *gid)
+{
+    const std::unique_ptr<FILE, close_stream> groups(std::fopen(group_file, "re"));
+    if (groups == nullptr) return errno;
+    char piece[512]; // of a line: that of a group with many members comes in several
+    bool at_line_start = true;
+    while (std::fgets(piece, sizeof piece, groups.get()) != nullptr) {
+        const std::string_view text(piece);
+        if (at_line_start && text.starts_with(admin_group) && number_in(piece, gid)) return 0;
+        at_line_start = text.ends_with('\n');
+    }
+    return std::ferror(groups.get()) != 0 ? EIO : ENOENT;
 }
 } // namespace
 } // namespace qn::cu
@@ -51,13 +70,7 @@ int cu_getadmin_group_id_1(gid_t *gid)
 {
     if (gid == nullptr) return EINVAL;
     const qn::platform::no_cancel whole;
-    for (size_t bytes = qn::cu::first_group_bytes; bytes <= qn::cu::most_group_bytes; bytes *= 4) {
-        const std::unique_ptr<char[]> scratch(new (std::nothrow) char[bytes]);
-        if (!scratch) return ENOMEM;
-        const int error = qn::cu::find_group(qn::cu::admin_group, {scratch.get(), bytes}, gid);
-        if (error != ERANGE) return error;
-    }
-    return ERANGE;
+    return qn::cu::find_admin_group(gid);
 }
 
 int cu_block_thread_allsig_except_syncsig_1(void)

@@ -129,6 +129,28 @@ TEST(AdministrativeGroup, IsMissedWhereThereIsNone)
     }));
 }
 
+TEST(AdministrativeGroup, IsNoGroupWhoseLineIsMalformedOrWhoseNameOnlyBeginsLikeIt)
+{
+    EXPECT_TRUE(with_groups("qnadm2:x:1:\n2qnadm:x:2:\nqnadm\nqnadm:x\nqnadm:x::\nqnadm:x:no:\nqnadm:x:99999999999:\n"
+                            "qnadm:x:4713:\n",
+                            [] {
+                                gid_t gid = 0;
+                                EXPECT_EQ(cu_getadmin_group_id_1(&gid), 0);
+                                EXPECT_EQ(gid, 4713U);
+                            }));
+}
+
+// A name in the middle of a line that is longer than what is read at a time is none.
+TEST(AdministrativeGroup, IsFoundAtTheStartOfALineOnly)
+{
+    for (size_t padding = 500; padding < 520; ++padding) {
+        EXPECT_TRUE(with_groups("g:x:1:" + std::string(padding, 'm') + "qnadm:x:3:\n", [] {
+            gid_t gid = 0;
+            EXPECT_EQ(cu_getadmin_group_id_1(&gid), ENOENT);
+        }));
+    }
+}
+
 TEST(AdministrativeGroup, NeedsAPlaceForItsNumber) { EXPECT_EQ(cu_getadmin_group_id_1(nullptr), EINVAL); }
 
 TEST(SignalMask, BlocksAllButWhatAThreadBringsUponItself)

@@ -5,7 +5,6 @@
 #include <cstring>
 #include <ctime>
 #include <fcntl.h>
-#include <grp.h>
 #include <sys/mman.h>
 #include <sys/stat.h>
 #include <sys/time.h>

@@ -224,6 +224,11 @@ TEST_F(PageSet, CannotBeMadeWithoutMemoryForAPage)
     EXPECT_EQ(last_error().code, 14);
     EXPECT_EQ(last_error().text, "2625-013 Memory allocation failed.\n");
     EXPECT_EQ(head->pMap, nullptr);
+    EXPECT_EQ(head->nextPage, nullptr) << "a single file as before";
+
+    EXPECT_EQ(start(head), 0);
+    for (int number = 1; number <= 3; ++number)
+        EXPECT_NE(page(number)->pMap, nullptr) << "the next start makes all of the ring";
 }
 
 TEST_F(PageSet, IsStoppedInTheOrderOfTheRing)

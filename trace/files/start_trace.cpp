@@ -42,6 +42,42 @@ pthread_mutex_t *new_recursive_mutex()
     return mutex;
 }
 
+// Frees the pages from `first` up to the head; none of them is mapped.
+void free_pages(const trace_anchor_t *head, trace_anchor_t *first)
+{
+    for (trace_anchor_t *page = first; page != nullptr && page != head;) {
+        trace_anchor_t *following = page->nextPage;
+        if (page->p_head_spool_anchor == head) {
+            pthread_mutex_destroy(&page->anchorMutex);
+            std::free(page);
+        } else {
+            store_relaxed(page->nextPage, nullptr); // a trace file of its own that had a page's name
+        }
+        page = following;
+    }
+}
+
+// A chain of page anchors from number 2 on, whose last leads to the head; null when memory runs out, which is recorded.
+trace_anchor_t *new_pages(trace_anchor_t *head, const char *base_name, qn_uint32_t pages)
+{
+    trace_anchor_t *first = head;
+    trace_anchor_t *last = nullptr;
+    for (qn_uint32_t number = 2; number <= pages; ++number) {
+        char page_name[trace_file_name_bytes];
+        name_page(page_name, base_name, number);
+        debug("creating page anchor '%s'\n", page_name);
+        trace_anchor_t *page = getSplAnchor(head, page_name);
+        if (page == nullptr) {
+            free_pages(head, first);
+            return nullptr;
+        }
+        page->nextPage = head;
+        (last != nullptr ? last->nextPage : first) = page;
+        last = page;
+    }
+    return first;
+}
+
 // Makes the anchor the head of a ring of `pages` page anchors.
 qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
 {
@@ -51,8 +87,10 @@ qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
     head->uRequestedFileSize = round_page_size(page_size, head->pageSize);
     store_relaxed(spool->pg_size, head->uRequestedFileSize);
 
+    char name_before[trace_file_name_bytes];
+    std::memcpy(name_before, head->fileName, sizeof name_before);
     char base_name[trace_file_name_bytes];
-    std::memcpy(base_name, head->fileName, sizeof base_name);
+    std::memcpy(base_name, name_before, sizeof base_name);
     reduce_to_trace_name(base_name);
     if (!has_room_for_page_names(base_name)) return set_error_str(QN_TR_EFILENAME, 17, head->fileName);
 
@@ -61,23 +99,17 @@ qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
     if (shared == nullptr) return set_error(QN_TR_ENOMEM, 14);
     name_page(head->fileName, base_name, 1);
     debug("creating page '%s'\n", head->fileName);
-    store_relaxed(head->nextPage, head);
+    store_release(head->pSpoolMutex, shared);
+
+    trace_anchor_t *first = new_pages(head, base_name, pages);
+    if (first == nullptr) {
+        set_file_name(head, name_before); // a single file as before; the next start tries again
+        return -1;
+    }
     head->pActivePg = head;
     head->ppActivePg = &head->pActivePg;
     head->p_head_spool_anchor = head;
-    store_release(head->pSpoolMutex, shared);
-
-    trace_anchor_t *last = head;
-    for (qn_uint32_t number = 2; number <= pages; ++number) {
-        char page_name[trace_file_name_bytes];
-        name_page(page_name, base_name, number);
-        debug("creating page anchor '%s'\n", page_name);
-        trace_anchor_t *page = getSplAnchor(head, page_name);
-        if (page == nullptr) return -1;
-        page->nextPage = head;
-        last->nextPage = page;
-        last = page;
-    }
+    store_relaxed(head->nextPage, first);
     return 0;
 }
 
@@ -176,16 +208,7 @@ qn_int32_t become_unbound(trace_anchor_t *anchor)
     if (!set) return set_error_int(QN_TR_ELOCK, 9, set.result());
     const qn_int32_t status = stop_trace(anchor, load_relaxed(this_is_child));
     release_all_obsolete_pages(anchor);
-    for (trace_anchor_t *page = anchor->nextPage; page != nullptr && page != anchor;) {
-        trace_anchor_t *following = page->nextPage;
-        if (page->p_head_spool_anchor == anchor) {
-            pthread_mutex_destroy(&page->anchorMutex);
-            std::free(page);
-        } else {
-            store_relaxed(page->nextPage, nullptr); // a trace file of its own that had a page's name
-        }
-        page = following;
-    }
+    free_pages(anchor, anchor->nextPage);
     store_relaxed(anchor->nextPage, nullptr);
     anchor->pActivePg = nullptr;
     anchor->ppActivePg = nullptr;

@@ -19,6 +19,7 @@ struct attacked_call {
     std::vector<qn_int32_t> codes;                 // what it may return under the attack, besides 0
     bool records_its_code = true;                  // in the thread's error record
     bool keeps_global_mutex = false;               // when it fails
+    uint64_t kept_by_spool_thread = 0;             // allocations: its error record
 };
 
 // What a process told at its end, in memory that it shares with the test.

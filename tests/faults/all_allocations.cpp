@@ -74,8 +74,8 @@ void free(void *block)
     __libc_free(block);
 }
 
-// A pattern that cannot be compiled for want of memory costs the C library some of it, for good. That is not held against
-// whoever compiled it.
+// A pattern that cannot be compiled for want of memory costs the C library some of it, for good. That is not held
+// against whoever compiled it.
 int __real_regcomp(regex_t *regex, const char *pattern, int flags);
 int __wrap_regcomp(regex_t *regex, const char *pattern, int flags)
 {

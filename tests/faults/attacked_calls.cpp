@@ -19,7 +19,9 @@ constexpr const char *file_bytes_text = "8192";
 
 // What a trace file's start may return: the file could not be started.
 const std::vector<qn_int32_t> start_codes = {9, 14, 17, 18, 19, 20, 21, 22, 23, 35};
-// The same, and a pattern that did not compile.
+// The same, and a page that there was no memory for.
+const std::vector<qn_int32_t> page_set_codes = {-1, 9, 14, 17, 18, 19, 20, 21, 22, 23, 35};
+// The codes of a start, and a pattern that did not compile.
 const std::vector<qn_int32_t> pattern_codes = {9, 14, 15, 16, 17, 18, 19, 20, 21, 22, 23, 35};
 
 client &component()
@@ -88,6 +90,9 @@ void wait_for_queue()
         if (spq.cnt == 0) return;
     }
 }
+
+// A spool thread that cannot be created is never tried again: so it is there before the attack on what it does.
+void start_spool_thread() { pthread_once(&sp_thread_once, mk_sp_thread); }
 
 // A page set of four pages of 8192 bytes each that are copied.
 void with_page_set(const std::string &folder)
@@ -158,7 +163,7 @@ std::vector<attacked_call> starting_calls()
              name_it(folder);
          },
          start_codes},
-        {"StartPageSet", with_page_set, name_it, unname_it, start_codes},
+        {"StartPageSet", with_page_set, name_it, unname_it, page_set_codes},
     };
 }
 
@@ -177,10 +182,13 @@ std::vector<attacked_call> spooling_calls()
          },
          nothing,
          {},
-         false},
+         false,
+         false,
+         1},
         {"CopyFile",
          [](const std::string &folder) {
              registered(folder);
+             start_spool_thread();
              write_file(copied_file, std::string(300000, 'x'));
              std::filesystem::create_directory(destination);
          },
@@ -191,7 +199,9 @@ std::vector<attacked_call> spooling_calls()
          },
          nothing,
          {},
-         false},
+         false,
+         false,
+         1},
         {"GetSpoolDirectory",
          [](const std::string &folder) { with_page_set(folder); },
          [](const std::string &) { return tr_get_spool_dir_1(trace_file.c_str()) != nullptr ? 0 : -1; },

@@ -34,9 +34,7 @@ protected:
 
     void fail_all_calls(running_out how)
     {
-        for (const char *name :
-             {"Register", "SpoolingStatus", "TraceLevels", "OpenQuery", "QueryProgram", "Flush", "Unregister"})
-            fail_each(attacked_call_named(name), how);
+        for (const attacked_call &call : attacked_calls()) fail_each(call, how);
         count("Every allocation fails in turn", "rounds", 1);
         count("Every allocation fails in turn", "faults", faults);
         count("Every allocation fails in turn", "executions", executions);

@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# The fault campaign: runs the tests of the label "faults" with all their rounds in the release build, then with their few
-# rounds under the sanitizers, and writes what was done into the table of docs/reliability.md.
+# The fault campaign: runs the tests of the label "faults" with all their rounds in the release build, then with their
+# few rounds under the sanitizers, and writes what was done into the table of docs/reliability.md.
 #
 #   tests/faults/run.sh
 #

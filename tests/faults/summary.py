@@ -3,8 +3,8 @@
 
     summary.py DOCUMENT BUILD...
 
-Each BUILD folder holds campaign.jsonl, the figures that the tests counted, and campaign.xml, how they ended. In DOCUMENT
-the table stands between two marker lines.
+Each BUILD folder holds campaign.jsonl, the figures that the tests counted, and campaign.xml, how they ended. In
+DOCUMENT the table stands between two marker lines.
 """
 import json
 import os

@@ -4,14 +4,17 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <unistd.h>
 
 #include <gtest/gtest.h>
 
 namespace qn::test
 {
-scratch::scratch()
+scratch::scratch() : scratch(std::filesystem::temp_directory_path().string()) {}
+
+scratch::scratch(const std::string &parent)
 {
-    std::string name = (std::filesystem::temp_directory_path() / "qn_tr_test_XXXXXX").string();
+    std::string name = parent + "/qn_tr_test_XXXXXX";
     if (mkdtemp(name.data()) == nullptr) std::abort();
     folder_ = name;
 }
@@ -20,6 +23,12 @@ scratch::~scratch()
 {
     std::error_code ignored;
     std::filesystem::remove_all(folder_, ignored);
+}
+
+std::string memory_folder()
+{
+    constexpr const char *in_memory = "/dev/shm";
+    return access(in_memory, W_OK | X_OK) == 0 ? in_memory : std::filesystem::temp_directory_path().string();
 }
 
 std::string file_bytes(const std::string &name)

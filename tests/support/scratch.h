@@ -9,6 +9,7 @@ class scratch
 {
 public:
     scratch();
+    explicit scratch(const std::string &parent);
     scratch(const scratch &) = delete;
     scratch &operator=(const scratch &) = delete;
     ~scratch();
@@ -19,6 +20,9 @@ public:
 private:
     std::string folder_;
 };
+
+// A folder for scratch folders whose files are in memory, where there is one: for tests that start thousands of traces.
+std::string memory_folder();
 
 // A file's bytes as they are on the disk; fails the test when it cannot be read.
 std::string file_bytes(const std::string &name);

@@ -86,7 +86,7 @@ enum {
     QN_TR_ENOTTRACE = 36,      /* not a trace file */
     QN_TR_EHANDLE = 37,        /* query handle invalid */
     QN_TR_EINUSE = 38,         /* component identifier already registered */
-    QN_TR_ECONFOPEN = 48,      /* the configuration file could not be opened */
+    QN_TR_ECONFOPEN = 48,      /* the configuration file could not be opened or read */
     QN_TR_EWRITE = 49          /* write() failed while a page or file was copied; only in the spool thread's record */
 };
 
@@ -466,7 +466,7 @@ typedef struct trace_raw_config {
 /*
  * Reads the configuration file; on success *pTraceRawConfig receives it, and the caller gives it back with
  * tr_free_trace_raw_config_1. Syntax errors mark their section and do not fail the call. Returns 0, 14, 48 (the file
- * could not be opened), or 42, 43, 44 (an internal pattern did not compile); on failure nothing is stored. Only 14 sets
+ * could not be opened or read), or 42, 43, 44 (an internal pattern did not compile); on failure nothing is stored. Only 14 sets
  * the error record. Not to be called by two threads at once.
  */
 QN_EXPORT qn_int32_t tr_read_conf_file_1(trace_raw_config_t **pTraceRawConfig);

@@ -214,6 +214,20 @@ TEST(FileSource, KeepsWhatWasReadBeforeMemoryRanOut)
     });
 }
 
+TEST(FileSource, GivesNothingWhenASectionWasLeftOutForWantOfMemory)
+{
+    int made = 0;
+    calls().calloc = [&](size_t count, size_t size) -> void * {
+        if (count * size == sizeof(trace_config_element_t) && ++made == 2) return nullptr;
+        return __real_calloc(count, size);
+    };
+    expect_from(section("a", {"pat = a"}) + section("b", {"pat = b"}) + section("c", {"pat = c"}), [](outcome &read) {
+        EXPECT_EQ(read.status, 14);
+        EXPECT_EQ(read.list.patterns(), lines{});
+        EXPECT_EQ(last_error().code, 14);
+    });
+}
+
 TEST(FileSource, TellsItsStatus)
 {
     debug_on();

@@ -57,6 +57,13 @@ TEST(ConfFile, NoErrorIsRecordedWhetherItIsThereOrNot)
     EXPECT_TRUE(marker_is_there());
 }
 
+// Half of a file would look like a configuration without the other half.
+TEST(ConfFile, AFileThatCannotBeReadToItsEndIs48)
+{
+    const scratch files;
+    EXPECT_EQ(read_conf_of(files.folder()).status, 48);
+}
+
 TEST(ConfFile, NothingStaysOpen)
 {
     const scratch files;

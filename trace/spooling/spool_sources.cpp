@@ -9,9 +9,11 @@
 
 #include "trace/files/anchor.h"
 #include "trace/files/debug.h"
+#include "trace/files/error_report.h"
 #include "trace/files/text.h"
 #include "trace/spooling/spool.h"
 #include "trace/spooling/spool_shape.h"
+#include "trace/traceutils/raw_config.h"
 #include "trace/traceutils/traceutils.h"
 
 namespace
@@ -97,6 +99,17 @@ struct configuration {
     }
 };
 
+// The interpreter leaves out what it finds no memory for. A trace would no longer be spooled for that.
+bool has_every_section(const configuration &file)
+{
+    qn_uint32_t sound = 0;
+    for (qn_int32_t i = 0; i < file.raw->num_element; ++i) {
+        const trace_raw_section_t *section = section_of(file.raw->ppChunkLst[i]);
+        if (section != nullptr && section->bErr_flag != 1) ++sound;
+    }
+    return sound == file.data->num_elements;
+}
+
 qn_int32_t append_section(const trace_element_t &section, trace_spool_spec_t **first, trace_spool_spec_t **last)
 {
     const spool_shape shape = shape_from_section(section);
@@ -110,6 +123,7 @@ qn_int32_t append_configuration_file(trace_spool_spec_t **first, trace_spool_spe
     qn_int32_t status = tr_read_conf_file_1(&file.raw);
     if (status == 0) status = tr_parse_all_sections_1(file.raw, &file.data, 1);
     if (status != 0) return status;
+    if (!has_every_section(file)) return set_error(QN_TR_ENOMEM, 14);
     for (qn_uint32_t i = 0; i < file.data->num_elements; ++i) {
         const trace_config_element_t *element = file.data->pTraceConfigElement[i];
         if (element->elementType != TRACE_ELEMENT) continue;

@@ -243,6 +243,8 @@ qn_int32_t read_conf_file(const char *file_name, trace_raw_config_t **config, co
         if (status == 0) status = parser.take(line, lines.number());
         if (status != 0) return status;
     }
+    // Half of a configuration would switch off whatever the other half asks for.
+    if (std::ferror(file.get()) != 0) return QN_TR_ECONFOPEN;
     status = parser.finish();
     if (status == 0) *config = result.release();
     return status;

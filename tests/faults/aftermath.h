@@ -20,6 +20,9 @@ struct attacked_call {
     bool records_its_code = true;                  // in the thread's error record
     bool keeps_global_mutex = false;               // when it fails
     uint64_t kept_by_spool_thread = 0;             // allocations: its error record
+    bool may_stay_failed = false;                  // until the configuration is read again
+    // The name of a file below the folder that is not what it should be when all is over, or nothing.
+    std::function<std::string(const std::string &)> half_made = [](const std::string &) { return std::string(); };
 };
 
 // What a process told at its end, in memory that it shares with the test.
@@ -38,6 +41,7 @@ struct aftermath {
     uint64_t allocations = 0;
     uint64_t descriptors = 0;
     uint64_t mappings = 0; // of files in the folder
+    char half_made[256] = "";
 
     std::string how_it_ended() const;
 };

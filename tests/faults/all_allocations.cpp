@@ -12,10 +12,11 @@ std::atomic<uint64_t> to_go{0}; // 0: none fails
 std::atomic<bool> for_good{false};
 std::atomic<uint64_t> failures{0};
 std::atomic<uint64_t> live{0};
-thread_local int64_t live_of_thread = 0; // allocated less freed by it
+thread_local bool in_regcomp = false;
 
 bool fails()
 {
+    if (in_regcomp) return false;
     uint64_t left = to_go.load();
     do {
         if (left == 0) return false;
@@ -27,15 +28,9 @@ bool fails()
     return true;
 }
 
-void add_to_live(int64_t blocks)
-{
-    live += static_cast<uint64_t>(blocks);
-    live_of_thread += blocks;
-}
-
 void *counted(void *block)
 {
-    if (block != nullptr) add_to_live(1);
+    if (block != nullptr) ++live;
     return block;
 }
 } // namespace
@@ -55,7 +50,7 @@ void *realloc(void *block, size_t bytes)
     if (fails()) return nullptr;
     void *moved = __libc_realloc(block, bytes);
     if (block == nullptr) return counted(moved);
-    if (moved == nullptr && bytes == 0) add_to_live(-1);
+    if (moved == nullptr && bytes == 0) --live;
     return moved;
 }
 void *memalign(size_t alignment, size_t bytes)
@@ -70,18 +65,19 @@ int posix_memalign(void **block, size_t alignment, size_t bytes)
 }
 void free(void *block)
 {
-    if (block != nullptr) add_to_live(-1);
+    if (block != nullptr) --live;
     __libc_free(block);
 }
 
-// A pattern that cannot be compiled for want of memory costs the C library some of it, for good. That is not held
-// against whoever compiled it.
+// Memory runs out before a pattern is compiled, not meanwhile: the C library's compiler frees a block twice when one of
+// several tables cannot grow, and loses memory.
 int __real_regcomp(regex_t *regex, const char *pattern, int flags);
 int __wrap_regcomp(regex_t *regex, const char *pattern, int flags)
 {
-    const int64_t before = live_of_thread;
+    if (fails()) return REG_ESPACE;
+    in_regcomp = true;
     const int result = __real_regcomp(regex, pattern, flags);
-    if (result != 0) add_to_live(before - live_of_thread);
+    in_regcomp = false;
     return result;
 }
 }

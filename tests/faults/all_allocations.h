@@ -1,6 +1,6 @@
 // Memory that runs out for everybody: a program linked with this file has malloc() and its kin of its own, through
-// which come the allocations of the library, of the C and the C++ library (operator new, regcomp(), fopen()) and of the
-// test. It needs the linker's --wrap for regcomp.
+// which come the allocations of the library, of the C and the C++ library (operator new, fopen()) and of the test. It needs
+// the linker's --wrap for regcomp.
 #pragma once
 
 #include <cstdint>

@@ -9,6 +9,7 @@
 #include "support/last_error.h"
 #include "support/scratch.h"
 #include "trace/trace.h"
+#include "trace/traceutils/traceutils.h"
 
 namespace
 {
@@ -16,6 +17,7 @@ using namespace qn::test;
 
 constexpr qn_uint32_t file_bytes = 8192;
 constexpr const char *file_bytes_text = "8192";
+constexpr size_t copied_bytes = 300000;
 
 // What a trace file's start may return: the file could not be started.
 const std::vector<qn_int32_t> start_codes = {9, 14, 17, 18, 19, 20, 21, 22, 23, 35};
@@ -37,6 +39,7 @@ std::string trace_file;
 std::string mapped_file;
 std::string copied_file;
 std::string destination;
+std::string spool;
 tr_query_handle_t query = nullptr;
 
 // Small files, and nothing from the environment or the configuration file of the machine.
@@ -46,6 +49,7 @@ void small_files(const std::string &folder)
     mapped_file = folder + "/map.trc";
     copied_file = folder + "/from";
     destination = folder + "/to";
+    spool = folder + "/spool";
     setenv("QN_TR_SIZE", file_bytes_text, 1);
     setenv("QN_TR_SPOOL", "none", 1);
 }
@@ -91,6 +95,15 @@ void wait_for_queue()
     }
 }
 
+// The name of a file below the folder that has another size, or nothing.
+std::string file_not_of_size(const std::string &folder, uintmax_t bytes)
+{
+    std::error_code no_folder;
+    for (const auto &entry : std::filesystem::recursive_directory_iterator(folder, no_folder))
+        if (entry.is_regular_file() && entry.file_size() != bytes) return entry.path().string();
+    return "";
+}
+
 // A spool thread that cannot be created is never tried again: so it is there before the attack on what it does.
 void start_spool_thread() { pthread_once(&sp_thread_once, mk_sp_thread); }
 
@@ -99,8 +112,8 @@ void with_page_set(const std::string &folder)
 {
     registered(folder);
     const qn::tr::global_lock global;
-    if (addSpoolCfgElement((folder + "/spool").c_str(), "app\\.trc", 4, 1, 60, &anchors.pFirstSpoolSpec,
-                           &anchors.pLastSpoolSpec, 0, file_bytes) != 0)
+    if (addSpoolCfgElement(spool.c_str(), "app\\.trc", 4, 1, 60, &anchors.pFirstSpoolSpec, &anchors.pLastSpoolSpec, 0,
+                           file_bytes) != 0)
         _exit(1);
 }
 
@@ -184,12 +197,14 @@ std::vector<attacked_call> spooling_calls()
          {},
          false,
          false,
-         1},
+         1,
+         false,
+         [](const std::string &) { return file_not_of_size(spool, file_bytes); }},
         {"CopyFile",
          [](const std::string &folder) {
              registered(folder);
              start_spool_thread();
-             write_file(copied_file, std::string(300000, 'x'));
+             write_file(copied_file, std::string(copied_bytes, 'x'));
              std::filesystem::create_directory(destination);
          },
          [](const std::string &) {
@@ -201,13 +216,18 @@ std::vector<attacked_call> spooling_calls()
          {},
          false,
          false,
-         1},
+         1,
+         false,
+         [](const std::string &) { return file_not_of_size(destination, copied_bytes); }},
         {"GetSpoolDirectory",
          [](const std::string &folder) { with_page_set(folder); },
          [](const std::string &) { return tr_get_spool_dir_1(trace_file.c_str()) != nullptr ? 0 : -1; },
          nothing,
          {-1},
-         false},
+         false,
+         false,
+         0,
+         true},
         {"CoreEvent",
          running,
          [](const std::string &) { return tr_core_event_1(trace_file.c_str(), "the end"); },
@@ -301,6 +321,24 @@ std::vector<attacked_call> other_calls()
          },
          nothing,
          {14}},
+        {"ReadConfiguration",
+         [](const std::string &folder) {
+             small_files(folder);
+             write_file(copied_file, "# note\ndefault:\ndest = /d\nt:\npat = /x\nspooling = ON\npages = 4\n");
+         },
+         [](const std::string &) {
+             trace_raw_config_t *sections = nullptr;
+             trace_conf_data_t *elements = nullptr;
+             qn_int32_t status = qn::tr::read_conf_file(copied_file.c_str(), &sections, nullptr);
+             if (status == 0) status = tr_parse_all_sections_1(sections, &elements, 0);
+             if (status == 0 && elements->num_elements != 2) status = -1; // a section was left out
+             tr_free_trace_raw_config_1(sections);
+             tr_free_trace_conf_data_1(elements);
+             return status;
+         },
+         nothing,
+         {-1, 14, 42, 43, 44, 48},
+         false},
         {"EveryWriter",
          running,
          [](const std::string &) {

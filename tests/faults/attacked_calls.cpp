@@ -6,7 +6,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include "support/last_error.h"
+#include "faults/program.h"
 #include "support/scratch.h"
 #include "trace/trace.h"
 #include "trace/traceutils/traceutils.h"
@@ -15,10 +15,6 @@ namespace
 {
 using namespace qn::test;
 
-constexpr qn_uint32_t file_bytes = 8192;
-constexpr const char *file_bytes_text = "8192";
-constexpr size_t copied_bytes = 300000;
-
 // What a trace file's start may return: the file could not be started.
 const std::vector<qn_int32_t> start_codes = {9, 14, 17, 18, 19, 20, 21, 22, 23, 35};
 // The same, and a page that there was no memory for.
@@ -26,73 +22,13 @@ const std::vector<qn_int32_t> page_set_codes = {-1, 9, 14, 17, 18, 19, 20, 21, 2
 // The codes of a start, and a pattern that did not compile.
 const std::vector<qn_int32_t> pattern_codes = {9, 14, 15, 16, 17, 18, 19, 20, 21, 22, 23, 35};
 
-client &component()
-{
-    static client program("COMP", 3);
-    return program;
-}
-
 void nothing(const std::string &) {}
 
-// The names that the calls are made with. They are there before the attack: it is not on the test.
-std::string trace_file;
-std::string mapped_file;
-std::string copied_file;
-std::string destination;
-std::string spool;
 tr_query_handle_t query = nullptr;
-
-// Small files, and nothing from the environment or the configuration file of the machine.
-void small_files(const std::string &folder)
-{
-    trace_file = folder + "/app.trc";
-    mapped_file = folder + "/map.trc";
-    copied_file = folder + "/from";
-    destination = folder + "/to";
-    spool = folder + "/spool";
-    setenv("QN_TR_SIZE", file_bytes_text, 1);
-    setenv("QN_TR_SPOOL", "none", 1);
-}
-
-qn_int32_t name_it(const std::string &) { return tr_set_filename_1(trace_file.c_str()); }
-void unname_it(const std::string &) { tr_set_filename_1(""); }
-
-void prepared_client(const std::string &folder)
-{
-    small_files(folder);
-    component();
-}
-
-void registered(const std::string &folder)
-{
-    prepared_client(folder);
-    if (component().register_now() != 0) _exit(1);
-}
-
-void running(const std::string &folder)
-{
-    registered(folder);
-    if (name_it(folder) != 0) _exit(1);
-}
 
 void remove_files(const std::string &folder)
 {
     for (const auto &entry : std::filesystem::directory_iterator(folder)) std::filesystem::remove_all(entry.path());
-}
-
-qn_int32_t write_some()
-{
-    qn_int32_t status = 0;
-    for (qn_uint32_t i = 0; i < 500; ++i) status |= tr_record_id_1("COMP", i);
-    return status;
-}
-
-void wait_for_queue()
-{
-    for (;; usleep(100)) {
-        const qn::tr::mutex_lock queue(spq.mutex);
-        if (spq.cnt == 0) return;
-    }
 }
 
 // The name of a file below the folder that has another size, or nothing.
@@ -104,34 +40,21 @@ std::string file_not_of_size(const std::string &folder, uintmax_t bytes)
     return "";
 }
 
-// A spool thread that cannot be created is never tried again: so it is there before the attack on what it does.
-void start_spool_thread() { pthread_once(&sp_thread_once, mk_sp_thread); }
-
-// A page set of four pages of 8192 bytes each that are copied.
-void with_page_set(const std::string &folder)
-{
-    registered(folder);
-    const qn::tr::global_lock global;
-    if (addSpoolCfgElement(spool.c_str(), "app\\.trc", 4, 1, 60, &anchors.pFirstSpoolSpec, &anchors.pLastSpoolSpec, 0,
-                           file_bytes) != 0)
-        _exit(1);
-}
-
 std::vector<attacked_call> starting_calls()
 {
     return {
         {"Register",
-         [](const std::string &folder) { prepared_client(folder); },
+         prepared,
          [](const std::string &) { return component().register_now(); },
          [](const std::string &) { tr_unregister_component_1("COMP"); },
          {14}},
         {"RegisterAndStart",
          [](const std::string &folder) {
-             prepared_client(folder);
-             setenv("QN_TR_FILENAME", trace_file.c_str(), 1);
+             prepared(folder);
+             setenv("QN_TR_FILENAME", files().trace.c_str(), 1);
              setenv("QN_TR_TRACE_LEVELS", "COMP:c0=4,X.*:.*=2", 1);
-             setenv("QN_TR_FILE_MAP", (mapped_file + ",COMP:c1").c_str(), 1);
-             setenv("QN_TR_FILE_SIZE", (mapped_file + ",4096").c_str(), 1);
+             setenv("QN_TR_FILE_MAP", (files().mapped + ",COMP:c1").c_str(), 1);
+             setenv("QN_TR_FILE_SIZE", (files().mapped + ",4096").c_str(), 1);
              setenv("QN_TR_SPOOL", ".*none:ON:4:/nonexistent:2097152", 1);
          },
          [](const std::string &) { return component().register_now(); },
@@ -140,7 +63,7 @@ std::vector<attacked_call> starting_calls()
         {"SetFileNameOfExistingFile",
          [](const std::string &folder) {
              running(folder);
-             write_some();
+             write_ids(0, 500);
              unname_it(folder);
          },
          name_it, unname_it, start_codes},
@@ -154,7 +77,7 @@ std::vector<attacked_call> starting_calls()
          {}},
         {"SetTraceLevels",
          [](const std::string &folder) {
-             prepared_client(folder);
+             prepared(folder);
              component() = client("COMP", 3, 0);
              if (component().register_now() != 0 || name_it(folder) != 0) _exit(1);
          },
@@ -166,13 +89,13 @@ std::vector<attacked_call> starting_calls()
          },
          pattern_codes},
         {"SetFileMap", registered,
-         [](const std::string &) { return tr_set_file_map_1(mapped_file.c_str(), "COMP:c[12]"); },
+         [](const std::string &) { return tr_set_file_map_1(files().mapped.c_str(), "COMP:c[12]"); },
          [](const std::string &) { tr_set_filename_1(nullptr); }, pattern_codes},
-        {"SetFileSize", running, [](const std::string &) { return tr_set_file_size_1("", 3 * file_bytes); },
+        {"SetFileSize", running, [](const std::string &) { return tr_set_file_size_1("", 3 * program_file_bytes); },
          [](const std::string &folder) {
              unname_it(folder);
              remove_files(folder);
-             tr_set_file_size_1("", file_bytes);
+             tr_set_file_size_1("", program_file_bytes);
              name_it(folder);
          },
          start_codes},
@@ -189,7 +112,7 @@ std::vector<attacked_call> spooling_calls()
              if (name_it(folder) != 0) _exit(1);
          },
          [](const std::string &) {
-             const qn_int32_t status = write_some();
+             const qn_int32_t status = write_ids(0, 500);
              wait_for_queue();
              return status;
          },
@@ -199,16 +122,16 @@ std::vector<attacked_call> spooling_calls()
          false,
          1,
          false,
-         [](const std::string &) { return file_not_of_size(spool, file_bytes); }},
+         [](const std::string &) { return file_not_of_size(files().spool, program_file_bytes); }},
         {"CopyFile",
          [](const std::string &folder) {
              registered(folder);
              start_spool_thread();
-             write_file(copied_file, std::string(copied_bytes, 'x'));
-             std::filesystem::create_directory(destination);
+             write_file(files().copied, std::string(copied_bytes, 'x'));
+             std::filesystem::create_directory(files().destination);
          },
          [](const std::string &) {
-             const qn_int32_t status = tr_copy_file_1(destination.c_str(), copied_file.c_str(), 0);
+             const qn_int32_t status = tr_copy_file_1(files().destination.c_str(), files().copied.c_str(), 0);
              wait_for_queue();
              return status;
          },
@@ -218,10 +141,10 @@ std::vector<attacked_call> spooling_calls()
          false,
          1,
          false,
-         [](const std::string &) { return file_not_of_size(destination, copied_bytes); }},
+         [](const std::string &) { return file_not_of_size(files().destination, copied_bytes); }},
         {"GetSpoolDirectory",
          [](const std::string &folder) { with_page_set(folder); },
-         [](const std::string &) { return tr_get_spool_dir_1(trace_file.c_str()) != nullptr ? 0 : -1; },
+         [](const std::string &) { return tr_get_spool_dir_1(files().trace.c_str()) != nullptr ? 0 : -1; },
          nothing,
          {-1},
          false,
@@ -230,7 +153,7 @@ std::vector<attacked_call> spooling_calls()
          true},
         {"CoreEvent",
          running,
-         [](const std::string &) { return tr_core_event_1(trace_file.c_str(), "the end"); },
+         [](const std::string &) { return tr_core_event_1(files().trace.c_str(), "the end"); },
          nothing,
          {14},
          false},
@@ -302,7 +225,7 @@ std::vector<attacked_call> other_calls()
              running(folder);
              unname_it(folder);
          },
-         [](const std::string &) { return tr_open_query_1(trace_file.c_str(), &query); },
+         [](const std::string &) { return tr_open_query_1(files().trace.c_str(), &query); },
          [](const std::string &) {
              tr_close_query_1(query);
              query = nullptr;
@@ -311,7 +234,7 @@ std::vector<attacked_call> other_calls()
         {"QueryProgram",
          [](const std::string &folder) {
              running(folder);
-             if (tr_open_query_1(trace_file.c_str(), &query) != 0) _exit(1);
+             if (tr_open_query_1(files().trace.c_str(), &query) != 0) _exit(1);
          },
          [](const std::string &) {
              char *program = nullptr;
@@ -324,12 +247,12 @@ std::vector<attacked_call> other_calls()
         {"ReadConfiguration",
          [](const std::string &folder) {
              small_files(folder);
-             write_file(copied_file, "# note\ndefault:\ndest = /d\nt:\npat = /x\nspooling = ON\npages = 4\n");
+             write_file(files().copied, "# note\ndefault:\ndest = /d\nt:\npat = /x\nspooling = ON\npages = 4\n");
          },
          [](const std::string &) {
              trace_raw_config_t *sections = nullptr;
              trace_conf_data_t *elements = nullptr;
-             qn_int32_t status = qn::tr::read_conf_file(copied_file.c_str(), &sections, nullptr);
+             qn_int32_t status = qn::tr::read_conf_file(files().copied.c_str(), &sections, nullptr);
              if (status == 0) status = tr_parse_all_sections_1(sections, &elements, 0);
              if (status == 0 && elements->num_elements != 2) status = -1; // a section was left out
              tr_free_trace_raw_config_1(sections);
@@ -342,7 +265,7 @@ std::vector<attacked_call> other_calls()
         {"EveryWriter",
          running,
          [](const std::string &) {
-             qn_int32_t status = write_some();
+             qn_int32_t status = write_ids(0, 500);
              status |= tr_record_string_1("COMP", "text");
              status |= tr_record_fmt_string_1("COMP", 1, "%d %s", 1, "text");
              status |= tr_record_data_1("COMP", 2, 1, "data", 4);

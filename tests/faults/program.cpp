@@ -1,0 +1,77 @@
+#include "faults/program.h"
+
+#include <cstdlib>
+
+#include <unistd.h>
+
+#include "trace/trace.h"
+
+namespace
+{
+qn::test::program_files names;
+}
+
+namespace qn::test
+{
+const program_files &files() { return names; }
+
+void small_files(const std::string &folder)
+{
+    names = {folder + "/app.trc", folder + "/map.trc", folder + "/from", folder + "/to", folder + "/spool"};
+    setenv("QN_TR_SIZE", std::to_string(program_file_bytes).c_str(), 1);
+    setenv("QN_TR_SPOOL", "none", 1);
+}
+
+client &component()
+{
+    static client program("COMP", 3);
+    return program;
+}
+
+void prepared(const std::string &folder)
+{
+    small_files(folder);
+    component();
+}
+
+void registered(const std::string &folder)
+{
+    prepared(folder);
+    if (component().register_now() != 0) _exit(1);
+}
+
+void running(const std::string &folder)
+{
+    registered(folder);
+    if (name_it(folder) != 0) _exit(1);
+}
+
+void with_page_set(const std::string &folder)
+{
+    registered(folder);
+    const qn::tr::global_lock global;
+    if (addSpoolCfgElement(names.spool.c_str(), "app\\.trc", 4, 1, 60, &anchors.pFirstSpoolSpec,
+                           &anchors.pLastSpoolSpec, 0, program_file_bytes) != 0)
+        _exit(1);
+}
+
+void start_spool_thread() { pthread_once(&sp_thread_once, mk_sp_thread); }
+
+qn_int32_t name_it(const std::string &) { return tr_set_filename_1(names.trace.c_str()); }
+void unname_it(const std::string &) { tr_set_filename_1(""); }
+
+qn_int32_t write_ids(qn_uint32_t first, qn_uint32_t count)
+{
+    qn_int32_t status = 0;
+    for (qn_uint32_t i = 0; i < count; ++i) status |= tr_record_id_1("COMP", first + i);
+    return status;
+}
+
+void wait_for_queue()
+{
+    for (;; usleep(100)) {
+        const qn::tr::mutex_lock queue(spq.mutex);
+        if (spq.cnt == 0) return;
+    }
+}
+} // namespace qn::test

@@ -1,0 +1,47 @@
+// The program that is attacked: one component, small files below one folder, and what it does with them.
+#pragma once
+
+#include <string>
+
+#include "support/last_error.h"
+
+namespace qn::test
+{
+inline constexpr qn_uint32_t program_file_bytes = 8192;
+inline constexpr size_t copied_bytes = 300000;
+
+// The names that the calls are made with. They are there before the attack: it is not on the test.
+struct program_files {
+    std::string trace;
+    std::string mapped;      // a second trace file
+    std::string copied;      // for tr_copy_file_1
+    std::string destination; // of that
+    std::string spool;
+};
+const program_files &files();
+
+// Sets the names, and that nothing comes from the environment or the configuration file of the machine.
+void small_files(const std::string &folder);
+
+client &component();
+
+// Each includes what the one before does, and ends the process when that fails.
+void prepared(const std::string &folder);
+void registered(const std::string &folder);
+void running(const std::string &folder); // its trace is started
+
+// Registered, with a page set of four pages to come that are copied.
+void with_page_set(const std::string &folder);
+
+// A spool thread that cannot be created is never tried again: so it is there before the attack on what it does.
+void start_spool_thread();
+
+qn_int32_t name_it(const std::string &);
+void unname_it(const std::string &);
+
+// Records of 32 bytes with the ids first, first + 1, ...; the statuses or-ed together.
+qn_int32_t write_ids(qn_uint32_t first, qn_uint32_t count);
+
+// Until everything is copied.
+void wait_for_queue();
+} // namespace qn::test

@@ -41,9 +41,7 @@ tr_file_token_t start_another(const std::string &file, uint32_t file_bytes)
     EXPECT_NE(anchor, nullptr);
     if (anchor == nullptr) return nullptr;
     anchor->uRequestedFileSize = file_bytes;
-    EXPECT_EQ(lock_anchor_set(anchor), 0);
-    EXPECT_EQ(start_trace(anchor), 0);
-    unlock_anchor_set(anchor);
+    EXPECT_EQ(qn::tr::start_trace_locked(anchor), 0);
     return anchor;
 }
 

@@ -1,4 +1,4 @@
-// Lazy initialisation from the environment, the fork handler and the stop switch. Global mutex, held by init's caller.
+// Lazy initialisation from the environment, the fork handlers and the stop switch. Global mutex, held by init's caller.
 #include "trace/files/library.h"
 
 #include <cstdlib>
@@ -59,6 +59,16 @@ void size_default_file(trace_anchor_t *anchor, const char *value)
 }
 
 tr_proxy_func_table_t _trp_funcs = {tr_flush_1, tr_record_vfmt_string_1};
+
+// A child that is forked before the library was initialised traces, and has a spool thread of its own.
+void be_usable_in_child()
+{
+    reset_locks_in_child();
+    if (!anchors.bInitialized) forget_spool_thread();
+}
+
+// Some calls take locks without initialising the library. So this handler is there from the start.
+[[gnu::constructor]] void handle_every_fork() { pthread_atfork(nullptr, nullptr, be_usable_in_child); }
 } // namespace
 
 int init(trace_anchor_t *anchor)
@@ -102,7 +112,6 @@ void atfork_child(void)
 {
     store_relaxed(this_is_child, 1);
     global_stop_trace();
-    reset_locks_in_child();
 }
 
 namespace qn::tr

@@ -73,6 +73,12 @@ extern qn_int32_t is_spool_running;
 extern pthread_once_t sp_thread_once;
 void mk_sp_thread(void);
 void *cp_thread(void *arg);
+namespace qn::tr
+{
+// In a forked child, where the thread does not exist: what is queued is the parent's, and the next call that needs the
+// thread makes one.
+void forget_spool_thread();
+} // namespace qn::tr
 
 // Copies a page or a file into its spool directory. Queue mutex, held by the caller. 0, or the recorded error's code.
 qn_int32_t do_spool(sp_q_element_t *elem);

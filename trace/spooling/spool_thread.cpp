@@ -168,3 +168,14 @@ qn_int32_t tr_copy_file_1(const char *dest, const char *file_name, int del)
     spool_enqueue(file_name, dest, nullptr, &spq, del);
     return 0;
 }
+
+namespace qn::tr
+{
+void forget_spool_thread()
+{
+    spq.pFirst = spq.pLast = nullptr;
+    spq.cnt = 0;
+    store_release(is_spool_running, 0);
+    sp_thread_once = PTHREAD_ONCE_INIT;
+}
+} // namespace qn::tr

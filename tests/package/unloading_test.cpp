@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 #include <qn_tr.h>
 
+#include "faults/campaign.h"
 #include "support/scratch.h"
 #include "support/trace_image.h"
 
@@ -30,8 +31,8 @@ TEST(Library, MayBeClosedWhileItsThreadRunsAndLoadedAgain)
     tr_detail_level_t level = 0;
     ASSERT_EQ(setenv("QN_TR_SPOOL", ("t$:ON:8:" + folder / "spool").c_str(), 1), 0);
 
-    constexpr qn_uint32_t rounds = 20;
-    for (qn_uint32_t round = 0; round < rounds; ++round) {
+    const qn_uint32_t times = rounds(20, 1000);
+    for (qn_uint32_t round = 0; round < times; ++round) {
         void *library = dlopen(QN_TR_LIBRARY, RTLD_NOW);
         ASSERT_NE(library, nullptr) << dlerror();
         if (round == 0) {
@@ -44,6 +45,7 @@ TEST(Library, MayBeClosedWhileItsThreadRunsAndLoadedAgain)
         EXPECT_EQ(dlclose(library), 0);
     }
     EXPECT_EQ(level, 1) << "the component is still registered";
-    EXPECT_EQ(trace_image::of_file(trace + ".1.sp").records_of(1).size(), rounds);
+    EXPECT_EQ(trace_image::of_file(trace + ".1.sp").records_of(1).size(), times);
+    count("Exit paths", "executions", times);
 }
 } // namespace

@@ -147,6 +147,21 @@ TEST_F(Follow, GoesOnBehindDamage)
     EXPECT_NE(shown.out.find("\"id\":1"), std::string::npos) << shown.out;
 }
 
+TEST_F(Follow, ShowsTheRecordsBehindADamagedNumber)
+{
+    trace_builder built;
+    built.put_u32(48, 0);
+    built.add_id(1);
+    built.put_u32(built.add_id(2) + 8, 0x40000000);
+    built.add_id(3);
+    built.close();
+    const auto path = folder.file("torn.trc", built.bytes());
+    const auto shown = run_qntrace({"follow", "--from-start", "--until-exit", "--json", path});
+    EXPECT_EQ(shown.status, 1);
+    EXPECT_NE(shown.err.find("sequence number 6 follows 1073741824"), std::string::npos) << shown.err;
+    EXPECT_NE(shown.out.find("\"id\":3"), std::string::npos) << shown.out;
+}
+
 TEST_F(Follow, EndsBySignalsWithAllThatWasWrittenShown)
 {
     live_writer writer(file);

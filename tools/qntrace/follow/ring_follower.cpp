@@ -70,7 +70,7 @@ std::optional<std::uint64_t> ring_follower::written_to(const ring_glance &now)
 {
     if (now.oldest != header_.ring.begin) return now.oldest;
     if (now.is_full_page() || (lap_under_way_ && same_lap(seen_.first, now.first))) return header_.ring.end;
-    if (now.first.seq == 0) return header_.ring.begin;
+    if (now.first.seq == 0) return header_.ring.begin + now.first.length; // a page's note, which is not counted
     return is_unfinished(now.first) ? written_behind(now) : header_.ring.end;
 }
 
@@ -140,6 +140,7 @@ void ring_follower::start_over(const ring_glance &now, std::uint64_t written)
 {
     lap_before_ = starts_over_++ < most_starts_at_oldest && written != header_.ring.end;
     at_ = lap_before_ ? written : header_.ring.begin;
+    in_order_ = false;
     usual_copy_bytes_ = first_copy_bytes;
     caught_up_ = true;
     time_base_ = reader::current_time_base(now.time_info);
@@ -277,7 +278,7 @@ void ring_follower::take(const tile &at, ring_listener &to)
     // Where the space for the next record is, it may just be taken: then this was a complete record. Or a writer has died
     // while he took it: then this is the newest number of all.
     if (at.offset == seen_.oldest && is_unfinished(at.header)) return;
-    if (!reader::is_numbered(at.header) || !pass_number(at)) return;
+    if (!reader::is_numbered(at.header) || !pass_number(at, to)) return;
     if (is_unfinished(at.header)) {
         to.found({reader::finding::severity::loss, at.offset,
                   fmt::format("this record was never completed by its writer (sequence number {})", at.header.seq),
@@ -288,12 +289,18 @@ void ring_follower::take(const tile &at, ring_listener &to)
 }
 
 // Whether the record is behind those that were handed out. Counts what is missing between them.
-bool ring_follower::pass_number(const tile &at)
+bool ring_follower::pass_number(const tile &at, ring_listener &to)
 {
     const std::uint32_t seq = at.header.seq;
     std::uint64_t missing = 0;
     if (last_seq_) {
-        if (!reader::later(seq, *last_seq_)) return false;
+        if (!reader::later(seq, *last_seq_)) {
+            if (!in_order_) return false;
+            to.found({reader::finding::severity::damage, at.offset,
+                      fmt::format("sequence number {} follows {}", seq, *last_seq_), seq});
+            last_seq_ = seq;
+            return true;
+        }
         missing = (seq - *last_seq_) / 2 - 1;
     } else if (since_start_ && seq > 2) {
         missing = seq / 2 - 1;
@@ -303,6 +310,7 @@ bool ring_follower::pass_number(const tile &at)
         lost_->count += missing;
     }
     last_seq_ = seq;
+    in_order_ = true;
     return true;
 }
 

@@ -94,7 +94,7 @@ private:
     bool is_cut_off(const tile &at) const;
     std::optional<touched_part> look_what_is_touched();
     void take(const tile &at, ring_listener &to);
-    bool pass_number(const tile &at);
+    bool pass_number(const tile &at, ring_listener &to);
     void hand_out(const tile &at, ring_listener &to);
     void damaged(std::uint64_t offset, std::uint64_t end, ring_listener &to);
     std::uint64_t longest_record() const;
@@ -109,6 +109,7 @@ private:
     bool begun_ = false;
     ring_glance seen_;           // `first` tells the lap that is being written
     bool lap_under_way_ = false; // something of it has been seen written
+    bool in_order_ = false;      // what comes is behind what was handed out, whatever its number is
     unsigned starts_over_ = 0;   // since records were handed out
     std::uint64_t target_ = 0;   // where the ring was written to at the beginning
     bool caught_up_ = false;

@@ -30,6 +30,8 @@
  * Start-up    is lazy: the first call that needs the library reads the environment (QN_TR_FILENAME, QN_TR_SIZE,
  *             QN_TR_DEBUG_LEVEL, QN_TR_USE_MSYNC, QN_TR_TRACE_LEVELS, QN_TR_FILE_MAP, QN_TR_FILE_SIZE, QN_TR_SPOOL)
  *             and registers tr_term() with atexit().
+ * Files       Nobody may truncate a trace file that a running program traces to: the program's next record there
+ *             would end it with SIGBUS. Remove or rename the file instead.
  * Stopped     After tr_term(), and in a forked child, tracing is stopped for good. The writers, tr_set_multipage_1,
  *             tr_set_file_map_1 and the size functions then return 0 and do nothing.
  */

@@ -123,9 +123,9 @@ void play(const attacked_call &call, const attack &attack, const std::string &fo
     _exit(0);
 }
 
-aftermath play_in_child(const attacked_call &call, const attack &attack)
+aftermath play_in_child(const attacked_call &call, const attack &attack, const std::string &parent)
 {
-    const scratch folder(memory_folder());
+    const scratch folder(parent);
     const shared_aftermath told;
     const pid_t child = fork();
     if (child == 0) play(call, attack, folder.folder(), *told);

@@ -8,6 +8,8 @@
 
 #include <qn_tr.h>
 
+#include "support/scratch.h"
+
 namespace qn::test
 {
 // An exported call, or several that belong together. Each function gets the name of a folder for files.
@@ -56,8 +58,8 @@ struct attack {
 // Plays the call in this process, with its files below `folder`, and does not return.
 [[noreturn]] void play(const attacked_call &call, const attack &attack, const std::string &folder, aftermath &told);
 
-// Plays it in a forked process and waits for its end.
-aftermath play_in_child(const attacked_call &call, const attack &attack);
+// Plays it in a forked process, with its files below a folder of its own in `parent`, and waits for its end.
+aftermath play_in_child(const attacked_call &call, const attack &attack, const std::string &parent = memory_folder());
 
 // An aftermath in memory that a child shares.
 class shared_aftermath

@@ -1,4 +1,5 @@
 // Stopping trace files, and the end of all tracing.
+#include <cerrno>
 #include <cstdlib>
 #include <sys/mman.h>
 #include <unistd.h>
@@ -38,6 +39,13 @@ void free_components(trace_anchor_t *anchor)
     }
 }
 
+// Whether the header can be written: where somebody truncated the file, the store would be the end of the program. A
+// kernel that cannot tell is taken at its best.
+bool is_header_there(const trace_anchor_t *anchor)
+{
+    return madvise(anchor->pMap, sizeof(trace_file_header_t), MADV_POPULATE_WRITE) == 0 || errno != EFAULT;
+}
+
 // Under the queue mutex, so that the thread cannot be between its last test and its wait; but a copy to a slow disk, for
 // which it holds that mutex, is not waited for.
 void wake_spool_thread()
@@ -66,7 +74,7 @@ qn_int32_t stop_trace_page(trace_anchor_t *anchor, int child)
     if (!child) {
         {
             const mutex_lock not_being_copied(spq.mutex);
-            store_relaxed(header_of(anchor)->uFlags, 0);
+            if (is_header_there(anchor)) store_relaxed(header_of(anchor)->uFlags, 0);
         }
         debug("**@ stop_trace_page - msync(MS_SYNC) for %s\n", anchor->fileName);
         msync(anchor->pMap, anchor->uActualFileSize, MS_SYNC);

@@ -4,7 +4,7 @@
 #include <gtest/gtest.h>
 
 #include "components/components_seen.h"
-#include "components/failing_memory.h"
+#include "support/failing_memory.h"
 #include "components/mutexes.h"
 #include "components/outcome.h"
 #include "support/scratch.h"

@@ -8,7 +8,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "components/failing_memory.h"
+#include "support/failing_memory.h"
 #include "components/mutexes.h"
 #include "components/outcome.h"
 #include "query/failing_file_calls.h"

@@ -6,7 +6,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include "components/failing_memory.h"
+#include "support/failing_memory.h"
 #include "components/outcome.h"
 #include "support/scratch.h"
 #include "trace/trace.h"

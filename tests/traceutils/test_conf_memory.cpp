@@ -5,7 +5,7 @@
 #include "components/outcome.h"
 #include "support/scratch.h"
 #include "traceutils/conf_seen.h"
-#include "traceutils/failing_calls.h"
+#include "support/failing_memory.h"
 
 namespace
 {

@@ -5,7 +5,7 @@
 #include <gtest/gtest.h>
 
 #include "traceutils/conf_seen.h"
-#include "traceutils/failing_calls.h"
+#include "support/failing_memory.h"
 
 namespace
 {

@@ -6,7 +6,7 @@
 
 #include "support/last_error.h"
 #include "traceutils/conf_seen.h"
-#include "traceutils/failing_calls.h"
+#include "support/failing_memory.h"
 
 namespace
 {

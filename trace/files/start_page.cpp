@@ -11,6 +11,7 @@
 #include <sys/vfs.h>
 #include <unistd.h>
 
+#include "trace/files/close.h"
 #include "trace/files/debug.h"
 #include "trace/files/error_report.h"
 #include "trace/files/library.h"
@@ -55,7 +56,7 @@ public:
     void opened(int fd) { anchor_->mapFd = fd_ = fd; }
     void close_descriptor()
     {
-        if (fd_ != -1) close(fd_);
+        if (fd_ != -1) close_for_sure(fd_);
         anchor_->mapFd = fd_ = -1;
     }
     qn_int32_t failed(qn_int32_t status)
@@ -174,7 +175,7 @@ void cancel_start_trace(void *pArg)
     trace_anchor_t *anchor = anchor_being_opened(fd);
     if (anchor != nullptr && anchor->pMap != nullptr) unmap_page(anchor);
     // Descriptor 0 is left open: it may be the client's own standard input.
-    if (fd != 0) close(fd);
+    if (fd != 0) close_for_sure(fd);
 }
 
 qn_int32_t start_trace_page(trace_anchor_t *anchor)

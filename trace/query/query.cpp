@@ -10,12 +10,14 @@
 #include <sys/vfs.h>
 #include <unistd.h>
 
+#include "trace/files/close.h"
 #include "trace/files/error_report.h"
 #include "trace/files/format.h"
 #include "trace/files/shared_words.h"
 
 namespace
 {
+using qn::tr::close_for_sure;
 using qn::tr::load_relaxed;
 
 constexpr char valid_id[4] = {'_', 'T', 'R', '_'};
@@ -85,7 +87,7 @@ void cancel_open_query(void *pArg)
     if (handle->pMap != nullptr) munmap(handle->pMap, static_cast<size_t>(handle->pMapEnd - handle->pMap));
     std::free(handle);
     // Descriptor 0 is never closed: it may be the client's own standard input.
-    if (fd != 0 && fd != -1) close(fd);
+    if (fd != 0 && fd != -1) close_for_sure(fd);
 }
 
 qn_int32_t tr_open_query_1(const qn_char_t *file_name, tr_query_handle_t *handle_p)
@@ -109,7 +111,7 @@ qn_int32_t tr_open_query_1(const qn_char_t *file_name, tr_query_handle_t *handle
     handle->pMapEnd = handle->pMap + page_size;
     const int fd = handle->fd;
     handle->fd = -1;
-    close(fd);
+    close_for_sure(fd);
     *handle_p = handle.give_away();
     return cu_set_no_error_1();
 }

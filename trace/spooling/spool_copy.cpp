@@ -13,6 +13,7 @@
 #include <sys/time.h>
 #include <unistd.h>
 
+#include "trace/files/close.h"
 #include "trace/files/debug.h"
 #include "trace/files/error_report.h"
 #include "trace/files/library.h"
@@ -34,7 +35,7 @@ public:
     descriptor &operator=(const descriptor &) = delete;
     ~descriptor()
     {
-        if (fd_ != -1) close(fd_);
+        if (fd_ != -1) close_for_sure(fd_);
     }
     int get() const { return fd_; }
     int release()

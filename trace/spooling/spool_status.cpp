@@ -2,6 +2,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <memory>
 
 #include "trace/files/debug.h"
 #include "trace/files/locks.h"
@@ -43,6 +44,27 @@ int unlock_anchor(trace_anchor_t *anchor)
     return result;
 }
 
+// Holds the global mutex, whatever came of locking it; releases it with its scope unless it is to stay locked.
+class global_lock_that_may_stay
+{
+public:
+    global_lock_that_may_stay() { lockGlobalMutex(); }
+    global_lock_that_may_stay(const global_lock_that_may_stay &) = delete;
+    global_lock_that_may_stay &operator=(const global_lock_that_may_stay &) = delete;
+    ~global_lock_that_may_stay()
+    {
+        if (!stays_) unlockGlobalMutex();
+    }
+    void stay() { stays_ = true; }
+
+private:
+    bool stays_ = false;
+};
+
+struct free_memory {
+    void operator()(void *memory) const { std::free(memory); }
+};
+
 // Fills one record per anchor; how many, or -1.
 qn_int32_t fill_records(tr_mini_spooling_anchor_t *records, qn_int32_t most)
 {
@@ -69,30 +91,27 @@ qn_int32_t tr_get_current_spooling_status_1(qn_int32_t *cnt, tr_mini_spooling_an
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
     *spa = nullptr;
     *cnt = 0;
-    lockGlobalMutex(); // the lock's result is not looked at
+    global_lock_that_may_stay global;
     qn_int32_t most = 0;
     {
         const mutex_lock list(anchor_list_mutex);
         most = static_cast<qn_int32_t>(anchors.numAnchors);
     }
-    auto *records = static_cast<tr_mini_spooling_anchor_t *>(
-        std::calloc(static_cast<size_t>(most), sizeof(tr_mini_spooling_anchor_t)));
+    const auto count = static_cast<size_t>(most);
+    std::unique_ptr<tr_mini_spooling_anchor_t, free_memory> records(
+        static_cast<tr_mini_spooling_anchor_t *>(std::calloc(count, sizeof(tr_mini_spooling_anchor_t))));
     *cnt = most;
     debug("get_current_spool_info: allocated %d structs\n", most);
-    // Kept: the caller has the global mutex then, and should end.
-    if (records == nullptr) return -1;
-
-    const qn_int32_t filled = fill_records(records, most);
-    if (filled >= 0) {
-        std::qsort(records, static_cast<size_t>(filled), sizeof *records, _strcmp);
-        *cnt = filled;
-        *spa = records;
-    } else {
-        std::free(records);
-        *cnt = 0;
+    if (records == nullptr) {
+        global.stay(); // that is the documented behaviour of the call
+        return -1;
     }
-    unlockGlobalMutex();
-    return filled >= 0 ? 0 : -1;
+    const qn_int32_t filled = fill_records(records.get(), most);
+    *cnt = filled >= 0 ? filled : 0;
+    if (filled < 0) return -1;
+    std::qsort(records.get(), static_cast<size_t>(filled), sizeof *records, _strcmp);
+    *spa = records.release();
+    return 0;
 }
 
 void tr_release_spool_info_1(qn_int32_t, tr_mini_spooling_anchor_t *spa) { std::free(spa); }

@@ -13,6 +13,7 @@ namespace
 constexpr std::size_t ring_begin = 200;
 constexpr std::uint32_t record_header = 28;
 constexpr std::uint32_t fixed_part = 36;
+constexpr std::uint16_t values_kind = 12;
 constexpr std::uint16_t unfinished = 0xFFFF;
 constexpr std::size_t oldest_at = 44;
 

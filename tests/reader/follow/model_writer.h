@@ -19,17 +19,17 @@ public:
 
     model_writer(std::size_t ring_bytes, after_store stored);
 
-    // An identifier record that repeats its number `words` times behind its header, so that a torn one is noticed; every
-    // word but the first is written over with it.
+    // A record of 32-bit values that repeats its number in every field and in `words` values, so that a torn one is
+    // noticed.
     void write(std::uint32_t words);
     // The stores of a record but for the last one, as of a writer that dies.
     void begin_and_die(std::uint32_t words);
-    // How many records were completed, and what the next one's number is.
+    // The newest number, which may be a filler's.
     std::uint32_t last_seq() const { return seq_; }
+    // The numbers of the records that were completed.
     const std::vector<std::uint32_t> &written() const { return written_; }
 
     std::span<const std::byte> bytes() const { return file_.bytes(); }
-    static constexpr std::uint16_t values_kind = 12;
 
 private:
     void store_u16(std::size_t at, std::uint16_t value);

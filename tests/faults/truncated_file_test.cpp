@@ -48,9 +48,14 @@ protected:
     void expect_next_process_to_go_on() const
     {
         EXPECT_EQ(in_process([] { return write_ids(1, 5) == 0; }), 0);
-        const auto records = trace_image::of_file(folder_ / "app.trc").records();
-        ASSERT_GE(records.size(), 5U);
-        EXPECT_EQ(records.back().u32(28), 5U);
+        expect_last_id("app.trc", 5);
+    }
+
+    void expect_last_id(const std::string &file, uint32_t id) const
+    {
+        const auto records = trace_image::of_file(folder_ / file).records();
+        ASSERT_FALSE(records.empty());
+        EXPECT_EQ(records.back().u32(28), id);
     }
 
     const scratch folder_{memory_folder()};
@@ -78,9 +83,7 @@ TEST_F(TruncatedFile, LeavesEveryOtherTraceOfTheProgramWhole)
         return write_ids(6, 5) == 0;
     });
     EXPECT_TRUE(WIFSIGNALED(status) && WTERMSIG(status) == SIGBUS) << status;
-    const auto records = trace_image::of_file(folder_ / "map.trc").records();
-    ASSERT_GE(records.size(), 5U);
-    EXPECT_EQ(records.back().u32(28), 5U);
+    expect_last_id("map.trc", 5);
 }
 
 TEST_F(TruncatedFile, IsLeftAloneByAProgramThatRecordsNothingMoreAndEnds)
@@ -101,7 +104,7 @@ TEST_F(TruncatedFile, IsGivenUpWhenTheTraceGetsAnotherName)
                   return tr_set_filename_1(files().mapped.c_str()) == 0 && write_ids(1, 5) == 0;
               }),
               0);
-    EXPECT_EQ(trace_image::of_file(folder_ / "map.trc").records().back().u32(28), 5U);
+    expect_last_id("map.trc", 5);
 }
 
 // This is how a trace file is emptied under a running program.
@@ -124,6 +127,6 @@ TEST_F(TruncatedFile, RenamedInsteadGoesOnUnderItsOtherName)
                   return write_ids(1, 5) == 0;
               }),
               0);
-    EXPECT_EQ(trace_image::of_file(folder_ / "map.trc").records().back().u32(28), 5U);
+    expect_last_id("map.trc", 5);
 }
 } // namespace

@@ -21,8 +21,11 @@
  *             calling thread's error record (cu_get_error_1 of qn_cu.h) with the code and a message; on success they
  *             record that no error occurred. The record writers return bare codes and leave the error record alone.
  * Strings     are NUL-terminated bytes, copied during the call; the caller keeps its own.
- * Threads     Every function may be called from any thread at any time. None may be called from a signal handler: all
- *             of them take a lock that the interrupted thread may hold.
+ * Threads     Every function may be called from any thread at any time.
+ * Signals     A signal handler may write records to a trace that is a single file with the writers that neither format
+ *             nor take an error (identifiers, strings, data, values). A writer that finds that the handler interrupted
+ *             this library on the same thread writes nothing and returns 9. A handler must keep errno itself. No other
+ *             function may be called from a handler: they allocate memory, and so does a page set when a page is full.
  * Cancelling  A thread cancelled (deferred cancellation) inside a call releases every lock that the call had taken and
  *             undoes what was half made. Asynchronous cancellation is not supported.
  * Fork        In a child made by fork() tracing is off for good: writers return 0 and write nothing, and no file of

@@ -40,6 +40,7 @@ bool copy_component(const component_anchor_t *component, tr_mini_component_ancho
 int tr_get_current_trace_levels_1(int *componentCount, tr_mini_component_anchor_t **components)
 {
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
+    const guard_mark mark;
     // Not a guard: when memory runs out the mutex stays locked. That is the documented behaviour of the call.
     lockGlobalMutex();
     const int count = count_components();

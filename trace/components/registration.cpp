@@ -113,6 +113,7 @@ public:
     void done() { component_ = nullptr; }
 
 private:
+    guard_mark mark_;
     int result_;
     component_anchor_t *component_ = nullptr;
 };

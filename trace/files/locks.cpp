@@ -33,6 +33,8 @@ void cleanup_anchor_set(void *anchor) { unlock_anchor_set(static_cast<trace_anch
 
 namespace qn::tr
 {
+constinit thread_local int guards_of_thread = 0;
+
 int lock_busy_mutex(pthread_mutex_t *mutex)
 {
     constexpr int first_pauses = 8;

@@ -15,6 +15,7 @@
 // cancellation unwinds the stack like an exception. So nothing between a guard and a cancellation point may be noexcept.
 #pragma once
 
+#include <atomic>
 #include <cerrno>
 #include <pthread.h>
 #include <sys/single_threaded.h>
@@ -47,6 +48,32 @@ extern pthread_mutex_t cluster_info_mutex;
 
 namespace qn::tr
 {
+// How many guards the calling thread is inside of. Only the thread itself changes it; a signal handler that interrupts it
+// leaves it as it was.
+extern constinit thread_local int guards_of_thread __attribute__((tls_model("initial-exec")));
+
+// Part of every guard: tells a signal handler on the same thread that a lock is held, or just being taken or released.
+// The locks are recursive and would let the handler in, amid what the thread is doing.
+class guard_mark
+{
+public:
+    guard_mark()
+    {
+        ++guards_of_thread;
+        std::atomic_signal_fence(std::memory_order_seq_cst);
+    }
+    guard_mark(const guard_mark &) = delete;
+    guard_mark &operator=(const guard_mark &) = delete;
+    ~guard_mark()
+    {
+        std::atomic_signal_fence(std::memory_order_seq_cst);
+        --guards_of_thread;
+    }
+};
+
+// Whether the caller interrupts the library on its own thread.
+inline bool interrupts_a_guard() { return guards_of_thread != 0; }
+
 // Holds a plain mutex. Test it: a lock that could not be taken is not released.
 class mutex_lock
 {
@@ -62,9 +89,11 @@ public:
     int result() const { return result_; }
 
 protected:
-    mutex_lock(pthread_mutex_t &mutex, int result) : mutex_(&mutex), result_(result) {}
+    using lock_call = int(pthread_mutex_t *);
+    mutex_lock(pthread_mutex_t &mutex, lock_call *lock) : mutex_(&mutex), result_(lock(&mutex)) {}
 
 private:
+    guard_mark mark_;
     pthread_mutex_t *mutex_;
     int result_;
 };
@@ -73,7 +102,10 @@ private:
 class mutex_try_lock : public mutex_lock
 {
 public:
-    explicit mutex_try_lock(pthread_mutex_t &mutex) : mutex_lock(mutex, pthread_mutex_trylock(&mutex)) {}
+    explicit mutex_try_lock(pthread_mutex_t &mutex) : mutex_lock(mutex, &try_lock) {}
+
+private:
+    static int try_lock(pthread_mutex_t *mutex) { return pthread_mutex_trylock(mutex); }
 };
 
 // Holds the global mutex.
@@ -133,6 +165,7 @@ public:
     int result() const { return result_; }
 
 private:
+    guard_mark mark_;
     pthread_mutex_t *mutex_ = nullptr;
     int result_;
 };

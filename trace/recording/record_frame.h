@@ -60,6 +60,7 @@ template <class Writer>
     qn_int32_t status = writer.check(anchor);
     if (status != 0) return status == nothing_to_write ? 0 : status;
 
+    if (interrupts_a_guard()) return QN_TR_ELOCK;
     const anchor_set_lock set(anchor);
     if (!set) return QN_TR_ELOCK;
     status = writer.check_locked(anchor);

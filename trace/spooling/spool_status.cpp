@@ -58,6 +58,7 @@ public:
     void stay() { stays_ = true; }
 
 private:
+    guard_mark mark_;
     bool stays_ = false;
 };
 

@@ -4,9 +4,9 @@
 #include <gtest/gtest.h>
 
 #include "components/components_seen.h"
-#include "support/failing_memory.h"
 #include "components/mutexes.h"
 #include "components/outcome.h"
+#include "support/failing_memory.h"
 #include "support/scratch.h"
 #include "support/system_log.h"
 

@@ -2,8 +2,8 @@
 #include <gtest/gtest.h>
 
 #include "components/components_seen.h"
-#include "support/failing_memory.h"
 #include "components/mutexes.h"
+#include "support/failing_memory.h"
 
 namespace
 {

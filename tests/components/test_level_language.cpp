@@ -3,9 +3,9 @@
 #include <gtest/gtest.h>
 
 #include "components/components_seen.h"
-#include "support/failing_memory.h"
 #include "components/mutexes.h"
 #include "components/outcome.h"
+#include "support/failing_memory.h"
 
 namespace
 {

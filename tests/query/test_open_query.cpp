@@ -8,10 +8,10 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "support/failing_memory.h"
 #include "components/mutexes.h"
 #include "components/outcome.h"
 #include "query/failing_file_calls.h"
+#include "support/failing_memory.h"
 #include "support/scratch.h"
 #include "trace/trace.h"
 

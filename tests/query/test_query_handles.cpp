@@ -6,8 +6,8 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include "support/failing_memory.h"
 #include "components/outcome.h"
+#include "support/failing_memory.h"
 #include "support/scratch.h"
 #include "trace/trace.h"
 

@@ -3,9 +3,9 @@
 #include <gtest/gtest.h>
 
 #include "components/outcome.h"
+#include "support/failing_memory.h"
 #include "support/scratch.h"
 #include "traceutils/conf_seen.h"
-#include "support/failing_memory.h"
 
 namespace
 {

@@ -4,8 +4,8 @@
 
 #include <gtest/gtest.h>
 
-#include "traceutils/conf_seen.h"
 #include "support/failing_memory.h"
+#include "traceutils/conf_seen.h"
 
 namespace
 {

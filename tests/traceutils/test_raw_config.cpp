@@ -4,9 +4,9 @@
 
 #include <gtest/gtest.h>
 
+#include "support/failing_memory.h"
 #include "support/last_error.h"
 #include "traceutils/conf_seen.h"
-#include "support/failing_memory.h"
 
 namespace
 {

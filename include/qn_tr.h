@@ -471,8 +471,8 @@ typedef struct trace_raw_config {
 /*
  * Reads the configuration file; on success *pTraceRawConfig receives it, and the caller gives it back with
  * tr_free_trace_raw_config_1. Syntax errors mark their section and do not fail the call. Returns 0, 14, 48 (the file
- * could not be opened or read), or 42, 43, 44 (an internal pattern did not compile); on failure nothing is stored. Only 14 sets
- * the error record. Not to be called by two threads at once.
+ * could not be opened or read), or 42, 43, 44 (an internal pattern did not compile); on failure nothing is stored.
+ * Only 14 sets the error record. Not to be called by two threads at once.
  */
 QN_EXPORT qn_int32_t tr_read_conf_file_1(trace_raw_config_t **pTraceRawConfig);
 

@@ -102,7 +102,8 @@ private:
     // Seconds since the base, for drawing.
     double seconds(std::int64_t time_ns) const
     {
-        return static_cast<double>(time_ns / second_ns - base_) + static_cast<double>(time_ns % second_ns) / 1e9;
+        const std::int64_t whole = time_ns / second_ns - base_;
+        return static_cast<double>(whole) + static_cast<double>(time_ns % second_ns) / 1e9;
     }
 
     std::string time_text(std::int64_t time_ns) { return times_.text(later_by({0, 0}, time_ns)).value_or("-"); }

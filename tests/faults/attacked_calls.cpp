@@ -124,12 +124,7 @@ std::vector<attacked_call> spooling_calls()
          false,
          [](const std::string &) { return file_not_of_size(files().spool, program_file_bytes); }},
         {"CopyFile",
-         [](const std::string &folder) {
-             registered(folder);
-             start_spool_thread();
-             write_file(files().copied, std::string(copied_bytes, 'x'));
-             std::filesystem::create_directory(files().destination);
-         },
+         with_file_to_copy,
          [](const std::string &) {
              const qn_int32_t status = tr_copy_file_1(files().destination.c_str(), files().copied.c_str(), 0);
              wait_for_queue();

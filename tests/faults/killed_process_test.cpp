@@ -206,12 +206,7 @@ TEST_F(KilledAtSystemCalls, CopyingPagesLeavesTheirRecords)
 TEST_F(KilledAtSystemCalls, CopyingAFileThatIsRemovedThenLeavesItOrItsCopy)
 {
     kill_everywhere(
-        [](const std::string &folder) {
-            registered(folder);
-            start_spool_thread();
-            write_file(files().copied, std::string(copied_bytes, 'x'));
-            std::filesystem::create_directory(files().destination);
-        },
+        with_file_to_copy,
         [](const std::string &) {
             tr_copy_file_1(files().destination.c_str(), files().copied.c_str(), 1);
             wait_for_queue();

@@ -1,9 +1,11 @@
 #include "faults/program.h"
 
 #include <cstdlib>
+#include <filesystem>
 
 #include <unistd.h>
 
+#include "support/scratch.h"
 #include "trace/trace.h"
 
 namespace
@@ -55,7 +57,13 @@ void with_page_set(const std::string &folder)
         _exit(1);
 }
 
-void start_spool_thread() { pthread_once(&sp_thread_once, mk_sp_thread); }
+void with_file_to_copy(const std::string &folder)
+{
+    registered(folder);
+    pthread_once(&sp_thread_once, mk_sp_thread);
+    write_file(names.copied, std::string(copied_bytes, 'x'));
+    std::filesystem::create_directory(names.destination);
+}
 
 qn_int32_t name_it(const std::string &) { return tr_set_filename_1(names.trace.c_str()); }
 void unname_it(const std::string &) { tr_set_filename_1(""); }

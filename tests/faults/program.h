@@ -33,8 +33,9 @@ void running(const std::string &folder); // its trace is started
 // Registered, with a page set of four pages to come that are copied.
 void with_page_set(const std::string &folder);
 
-// A spool thread that cannot be created is never tried again: so it is there before the attack on what it does.
-void start_spool_thread();
+// Registered, with a file to copy and a directory for the copy. The spool thread is there before the attack on what it
+// does: one that cannot be created is never tried again.
+void with_file_to_copy(const std::string &folder);
 
 qn_int32_t name_it(const std::string &);
 void unname_it(const std::string &);

@@ -40,14 +40,15 @@ bool copy_component(const component_anchor_t *component, tr_mini_component_ancho
 int tr_get_current_trace_levels_1(int *componentCount, tr_mini_component_anchor_t **components)
 {
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
-    const guard_mark mark;
-    // Not a guard: when memory runs out the mutex stays locked. That is the documented behaviour of the call.
-    lockGlobalMutex();
+    global_lock_that_may_stay global;
     const int count = count_components();
     auto *snapshot = static_cast<tr_mini_component_anchor_t *>(
         std::calloc(count > 0 ? static_cast<size_t>(count) : 1, sizeof(tr_mini_component_anchor_t)));
     *components = snapshot;
-    if (snapshot == nullptr) return -1;
+    if (snapshot == nullptr) {
+        global.stay(); // that is the documented behaviour of the call
+        return -1;
+    }
     *componentCount = count;
 
     const component_anchor_t *component = anchors.pFirstComp;
@@ -55,9 +56,9 @@ int tr_get_current_trace_levels_1(int *componentCount, tr_mini_component_anchor_
         if (copy_component(component, snapshot[i])) continue;
         tr_release_comp_info_1(count, snapshot);
         *components = nullptr;
+        global.stay();
         return -1;
     }
-    unlockGlobalMutex();
     return 0;
 }
 

@@ -115,6 +115,24 @@ public:
     global_lock() : mutex_lock(anchors.anchorMutex) {}
 };
 
+// Holds the global mutex, whatever came of locking it; releases it with its scope unless it is to stay locked.
+class global_lock_that_may_stay
+{
+public:
+    global_lock_that_may_stay() { lockGlobalMutex(); }
+    global_lock_that_may_stay(const global_lock_that_may_stay &) = delete;
+    global_lock_that_may_stay &operator=(const global_lock_that_may_stay &) = delete;
+    ~global_lock_that_may_stay()
+    {
+        if (!stays_) unlockGlobalMutex();
+    }
+    void stay() { stays_ = true; }
+
+private:
+    guard_mark mark_;
+    bool stays_ = false;
+};
+
 // The mutex that is the anchor's set lock right now.
 inline pthread_mutex_t *anchor_set_mutex(trace_anchor_t *anchor)
 {

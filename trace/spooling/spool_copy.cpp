@@ -17,6 +17,7 @@
 #include "trace/files/debug.h"
 #include "trace/files/error_report.h"
 #include "trace/files/library.h"
+#include "trace/files/releases.h"
 #include "trace/spooling/spool_list.h"
 
 namespace
@@ -49,10 +50,6 @@ private:
     int fd_;
 };
 
-struct free_memory {
-    void operator()(void *memory) const { std::free(memory); }
-};
-
 int open_retrying(const char *file_name, int flags)
 {
     int fd = -1;
@@ -74,7 +71,7 @@ qn_int32_t copy_contents(const char *from_name, int to)
 {
     const descriptor from(open_retrying(from_name, O_RDONLY));
     if (from.get() == -1) return open_failed(from_name, false);
-    const std::unique_ptr<void, free_memory> buffer(std::malloc(copy_chunk_bytes));
+    const std::unique_ptr<void, releases<std::free>> buffer(std::malloc(copy_chunk_bytes));
     if (buffer == nullptr) return set_error(QN_TR_ENOMEM, 14);
     for (;;) {
         const ssize_t length = read(from.get(), buffer.get(), copy_chunk_bytes);

@@ -6,6 +6,7 @@
 
 #include "trace/files/debug.h"
 #include "trace/files/locks.h"
+#include "trace/files/releases.h"
 #include "trace/files/text.h"
 #include "trace/spooling/spool.h"
 
@@ -44,28 +45,6 @@ int unlock_anchor(trace_anchor_t *anchor)
     return result;
 }
 
-// Holds the global mutex, whatever came of locking it; releases it with its scope unless it is to stay locked.
-class global_lock_that_may_stay
-{
-public:
-    global_lock_that_may_stay() { lockGlobalMutex(); }
-    global_lock_that_may_stay(const global_lock_that_may_stay &) = delete;
-    global_lock_that_may_stay &operator=(const global_lock_that_may_stay &) = delete;
-    ~global_lock_that_may_stay()
-    {
-        if (!stays_) unlockGlobalMutex();
-    }
-    void stay() { stays_ = true; }
-
-private:
-    guard_mark mark_;
-    bool stays_ = false;
-};
-
-struct free_memory {
-    void operator()(void *memory) const { std::free(memory); }
-};
-
 // Fills one record per anchor; how many, or -1.
 qn_int32_t fill_records(tr_mini_spooling_anchor_t *records, qn_int32_t most)
 {
@@ -99,7 +78,7 @@ qn_int32_t tr_get_current_spooling_status_1(qn_int32_t *cnt, tr_mini_spooling_an
         most = static_cast<qn_int32_t>(anchors.numAnchors);
     }
     const auto count = static_cast<size_t>(most);
-    std::unique_ptr<tr_mini_spooling_anchor_t, free_memory> records(
+    std::unique_ptr<tr_mini_spooling_anchor_t, releases<std::free>> records(
         static_cast<tr_mini_spooling_anchor_t *>(std::calloc(count, sizeof(tr_mini_spooling_anchor_t))));
     *cnt = most;
     debug("get_current_spool_info: allocated %d structs\n", most);

@@ -11,6 +11,7 @@
 #include <strings.h>
 
 #include "trace/files/error_report.h"
+#include "trace/files/releases.h"
 #include "trace/files/text.h"
 #include "trace/traceutils/conf_line.h"
 #include "trace/traceutils/raw_config.h"
@@ -20,14 +21,6 @@ namespace qn::tr
 {
 namespace
 {
-template <auto release>
-struct releases {
-    template <typename type>
-    void operator()(type *what) const
-    {
-        release(what);
-    }
-};
 using file_ptr = std::unique_ptr<FILE, releases<std::fclose>>;
 using text_ptr = std::unique_ptr<char, releases<std::free>>;
 using section_ptr = std::unique_ptr<trace_raw_section_t, releases<free_raw_section>>;

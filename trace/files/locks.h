@@ -57,9 +57,9 @@ extern constinit thread_local int guards_of_thread __attribute__((tls_model("ini
 class guard_mark
 {
 public:
-    guard_mark()
+    guard_mark() : before_(guards_of_thread)
     {
-        ++guards_of_thread;
+        guards_of_thread = before_ + 1;
         std::atomic_signal_fence(std::memory_order_seq_cst);
     }
     guard_mark(const guard_mark &) = delete;
@@ -67,8 +67,11 @@ public:
     ~guard_mark()
     {
         std::atomic_signal_fence(std::memory_order_seq_cst);
-        --guards_of_thread;
+        guards_of_thread = before_;
     }
+
+private:
+    int before_;
 };
 
 // Whether the caller interrupts the library on its own thread.

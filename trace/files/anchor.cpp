@@ -42,6 +42,7 @@ void initAnchor(trace_anchor_t *anchor)
     anchor->pMapEnd = nullptr;
     anchor->pNextFree = nullptr;
     anchor->pWrap = nullptr;
+    anchor->pRing = nullptr;
     anchor->uActualFileSize = 0;
     anchor->uMaxSize = 0;
     anchor->pFirstTraceSpec = nullptr;

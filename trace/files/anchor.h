@@ -33,7 +33,8 @@ struct trace_anchor {
     unsigned char *pMapEnd;      // one past the mapping
     qn_uint32_t seqNumber;       // of the last record
     trace_record_header_t *pNextFree;
-    trace_record_header_t *pWrap;         // start of the ring
+    trace_record_header_t *pWrap;         // where a lap of the ring begins: behind a page's notice
+    trace_record_header_t *pRing;         // start of the ring, as it was found at the start
     qn_uint32_t uMaxSize;                 // longest record; 0 while the file is not started. Also read without the lock
     qn_int32_t pageSize;                  // of memory
     component_anchor_t *pFirstComp;       // default anchor. Global mutex and component list mutex

@@ -26,6 +26,11 @@ qn_uint16_t node_number()
     return cluster.result == 0 ? static_cast<qn_uint16_t>(cluster.info.cu_node_number) : qn_uint16_t{0};
 }
 
+qn_uint8_t properties_of_this_host()
+{
+    return format::properties::always | (host_is_little_endian() ? format::properties::little_endian : 0);
+}
+
 qn_uint8_t initial_page_state(const trace_anchor_t *anchor)
 {
     if (!spooling_is_on(anchor)) return 0;
@@ -44,6 +49,15 @@ bool host_is_little_endian()
     return first != 0;
 }
 
+void restore_layout(trace_anchor_t *anchor, const trace_record_header_t *ring)
+{
+    trace_file_header_t *header = header_of(anchor);
+    header->uProperties = properties_of_this_host();
+    if (header->uVersion > format::format_version) header->uVersion = format::format_version;
+    header->uOffset = static_cast<qn_uint32_t>(reinterpret_cast<const unsigned char *>(ring) - anchor->pMap);
+    header->uActualFileSize = static_cast<qn_uint32_t>(anchor->pMapEnd - anchor->pMap);
+}
+
 void set_build_name(trace_file_header_t *header, const char *identifier)
 {
     const char *name = identifier[0] != '\0' ? identifier : "Unknown";
@@ -55,9 +69,7 @@ void set_build_name(trace_file_header_t *header, const char *identifier)
 qn_int32_t init_trace_header(trace_anchor_t *anchor)
 {
     trace_file_header_t *header = header_of(anchor);
-    header->uProperties = 0;
-    if (host_is_little_endian()) header->uProperties |= format::properties::little_endian;
-    header->uProperties |= format::properties::always;
+    header->uProperties = properties_of_this_host();
     header->uPlatform = format::platform_linux;
     header->uVersion = format::format_version;
     header->uOffset = format::header_bytes;

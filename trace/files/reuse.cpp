@@ -139,7 +139,7 @@ bool reuse_ring(trace_anchor_t *anchor, const program_names &names)
     if (damage != nullptr) return refuse(anchor, damage);
 
     anchor->seqNumber = walk.last_sequence();
-    anchor->pWrap = record_at(anchor, walk.ring_start());
+    anchor->pWrap = anchor->pRing = record_at(anchor, walk.ring_start());
     anchor->pNextFree = record_at(anchor, walk.free_offset());
     debug("\ttrace: Re-using existing file.\n");
     return true;
@@ -147,7 +147,7 @@ bool reuse_ring(trace_anchor_t *anchor, const program_names &names)
 
 void init_ring(trace_anchor_t *anchor)
 {
-    anchor->pWrap = record_at(anchor, format::header_bytes);
+    anchor->pWrap = anchor->pRing = record_at(anchor, format::header_bytes);
     anchor->seqNumber = 0;
     anchor->pWrap->length = anchor->uActualFileSize - format::header_bytes;
     anchor->pWrap->function = static_cast<qn_uint16_t>(format::kind::free_space);

@@ -239,6 +239,7 @@ void unmap_page(trace_anchor_t *anchor)
     anchor->pMapEnd = nullptr;
     store_relaxed(anchor->uMaxSize, 0);
     anchor->pWrap = nullptr;
+    anchor->pRing = nullptr;
     anchor->pNextFree = nullptr;
     anchor->uActualFileSize = 0;
 }

@@ -71,6 +71,10 @@ void init_ring(trace_anchor_t *anchor);
 // Whether multi-byte integers are stored with their low byte first here.
 bool host_is_little_endian();
 
+// Writes again what a reader must know to find the ring, which begins at `ring`. Another process that has the file
+// mapped may have stored anything there, so this is done whenever a lap begins.
+void restore_layout(trace_anchor_t *anchor, const trace_record_header_t *ring);
+
 // Copies the build identifier into a header, or "Unknown" when it is empty.
 void set_build_name(trace_file_header_t *header, const char *build_identifier);
 

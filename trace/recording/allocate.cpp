@@ -33,6 +33,13 @@ bool is_multipage(const trace_anchor_t *anchor)
            anchor->ppActivePg != nullptr;
 }
 
+// A record that a whole empty page cannot take, which only a reader's request to wait lets through, would go from page to
+// page for good.
+[[gnu::noinline]] trace_record_header_t *go_on_in_next_page(trace_anchor_t *page, unsigned int *requested)
+{
+    return page->pNextFree != page->pWrap ? pageFull(page, requested) : nullptr;
+}
+
 qn_uint32_t bytes_to_end(const trace_anchor_t *anchor, const trace_record_header_t *record)
 {
     return static_cast<qn_uint32_t>(anchor->pMapEnd - reinterpret_cast<const unsigned char *>(record));
@@ -62,9 +69,28 @@ struct start_of_process {
     store_relaxed(header->uPid, start.pid);
 }
 
+// Whether the calling thread starts a damaged trace afresh. Who damages rings may be at it still, and meet the start
+// record of the fresh one: that ring is then left to the next writer, or this would never end.
+class fresh_start
+{
+public:
+    fresh_start() { ++in_progress_; }
+    fresh_start(const fresh_start &) = delete;
+    fresh_start &operator=(const fresh_start &) = delete;
+    ~fresh_start() { --in_progress_; }
+    static bool is_in_progress() { return in_progress_ != 0; }
+
+private:
+    static thread_local int in_progress_;
+};
+
+constinit thread_local int fresh_start::in_progress_ = 0;
+
 [[gnu::cold, gnu::noinline]] trace_record_header_t *give_up(trace_anchor_t *anchor, const char *reason)
 {
     log_trc_error(reason, '0');
+    if (fresh_start::is_in_progress()) return nullptr;
+    const fresh_start afresh;
     trace_reinit(anchor);
     return nullptr;
 }
@@ -95,6 +121,7 @@ struct start_of_process {
     filler->seqNumber = anchor->seqNumber;
     keep_store_order();
     anchor->pNextFree = anchor->pWrap;
+    restore_layout(anchor, anchor->pWrap);
     store_relaxed(header_of(anchor)->uOldestRecordOffset, header_of(anchor)->uOffset);
     keep_store_order();
     filler->function = free_space;
@@ -163,7 +190,7 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
         next = record_of(behind_next);
         if (__builtin_expect(behind_next == end, 0)) {
             if (wrapped) return give_up(pAnchor, "opal_trace: allocate_space allocation loop overwrap\n");
-            if (is_multipage(pAnchor)) return pageFull(pAnchor, pReqLength);
+            if (is_multipage(pAnchor)) return go_on_in_next_page(pAnchor, pReqLength);
             wrapped = true;
             wrap_round(pAnchor, static_cast<qn_uint32_t>(consumed));
             next = pAnchor->pNextFree;

@@ -72,9 +72,10 @@ void make_free(trace_record_header_t *record, qn_uint32_t length, qn_uint32_t se
 void empty_ring(trace_anchor_t *page)
 {
     trace_file_header_t *header = header_of(page);
+    page->pWrap = page->pRing;
+    restore_layout(page, page->pRing);
     store_relaxed(header->uOldestRecordOffset, header->uOffset);
     keep_store_order();
-    page->pWrap = record_at(page, header->uOffset);
     page->seqNumber = 0;
     page->pWrap->function = static_cast<qn_uint16_t>(format::kind::being_written);
     keep_store_order();

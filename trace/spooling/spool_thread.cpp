@@ -4,6 +4,7 @@
 // one: the global mutex and set locks, for the configuration and for syncing.
 #include <csignal>
 #include <cstdlib>
+#include <ctime>
 #include <pthread.h>
 #include <sys/mman.h>
 
@@ -71,30 +72,38 @@ void wait_for_work(qn_uint32_t seconds)
     pthread_cond_timedwait(&spq.cond, &spq.mutex, &deadline);
 }
 
-// Looks at the oldest page. A page in any state but full and reusable is left where it is.
-void handle_page(trace_anchor_t *page)
+// Looks at the oldest page; false when its element is left where it is: another process has put the page into a state
+// that is neither full nor reusable.
+bool handle_page(trace_anchor_t *page)
 {
-    if (page->pMap == nullptr) return std::free(spool_dequeue_last_element_inside_spq(&spq));
-    qn_uint8_t &state = header_of(page)->sp_flags;
-    debug("cp_thread checking flags: %d\n", load_relaxed(state));
-    if (load_relaxed(state) == format::page_state::full) {
-        store_relaxed(state, format::page_state::being_spooled);
-        spool_dequeue_last_and_spool_inside_spq(&spq);
-    } else if (load_relaxed(state) == format::page_state::ready) {
+    if (page->pMap == nullptr) {
         std::free(spool_dequeue_last_element_inside_spq(&spq));
+        return true;
     }
+    qn_uint8_t &in_file = header_of(page)->sp_flags;
+    const qn_uint8_t state = load_relaxed(in_file);
+    debug("cp_thread checking flags: %d\n", state);
+    if (state == format::page_state::full) {
+        store_relaxed(in_file, format::page_state::being_spooled);
+        spool_dequeue_last_and_spool_inside_spq(&spq);
+        return true;
+    }
+    if (state != format::page_state::ready) return false;
+    std::free(spool_dequeue_last_element_inside_spq(&spq));
+    return true;
 }
 
-// Lets whoever holds a page's lock get on: that is mostly a writer who is taking the page over and needs the queue.
-void wait_for_page_lock()
+// Lets others get on: mostly a writer who is taking the page over and needs the queue, or the process that has the page
+// in its hands. By a clock that nobody sets.
+void wait_a_moment()
 {
     constexpr long wait_ns = 1000000;
     timespec deadline{};
-    cu_get_current_time_1(&deadline);
+    clock_gettime(CLOCK_MONOTONIC, &deadline);
     deadline.tv_nsec += wait_ns;
     deadline.tv_sec += deadline.tv_nsec / 1000000000;
     deadline.tv_nsec %= 1000000000;
-    pthread_cond_timedwait(&spq.cond, &spq.mutex, &deadline);
+    pthread_cond_clockwait(&spq.cond, &spq.mutex, CLOCK_MONOTONIC, &deadline);
 }
 
 void handle_oldest()
@@ -105,11 +114,12 @@ void handle_oldest()
 
     // A page's lock comes before the queue's: it may be tried here, never waited for. The page is there as long as its
     // element is.
-    const mutex_try_lock page_lock(page->anchorMutex);
-    if (page_lock)
-        handle_page(page);
-    else
-        wait_for_page_lock();
+    bool handled = false;
+    {
+        const mutex_try_lock page_lock(page->anchorMutex);
+        handled = page_lock && handle_page(page);
+    }
+    if (!handled) wait_a_moment();
 }
 
 void work_until_stopped()

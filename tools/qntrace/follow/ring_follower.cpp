@@ -17,6 +17,13 @@ constexpr std::size_t first_copy_bytes = 4 * 1024;
 constexpr std::size_t most_copy_bytes = 256 * 1024;
 constexpr unsigned most_starts_at_oldest = 16;
 
+// A filler whose number is 0 has none, except where the numbers go round with it.
+bool has_number(const reader::record_header &header, std::optional<std::uint32_t> before)
+{
+    constexpr std::uint32_t greatest = 0xFFFFFFFE;
+    return reader::is_numbered(header) || (header.seq == 0 && before == greatest);
+}
+
 bool carries_body(const reader::record_header &header) { return !is_free(header) && !is_unfinished(header); }
 
 } // namespace
@@ -126,7 +133,7 @@ bool ring_follower::ends_before(const reader::record_header &first_of_next_lap)
         if (bytes.size() < format::record_header_bytes) return false;
         const auto header = reader::parse_record_header(reader::byte_view(bytes, header_.order));
         if (header.length < format::record_header_bytes || header.length > header_.ring.end - at) return false;
-        if (reader::is_numbered(header)) {
+        if (has_number(header, last)) {
             if (header.seq != *last + 2) return false;
             last = header.seq;
         }
@@ -278,7 +285,7 @@ void ring_follower::take(const tile &at, ring_listener &to)
     // Where the space for the next record is, it may just be taken: then this was a complete record. Or a writer has died
     // while he took it: then this is the newest number of all.
     if (at.offset == seen_.oldest && is_unfinished(at.header)) return;
-    if (!reader::is_numbered(at.header) || !pass_number(at, to)) return;
+    if (!has_number(at.header, last_seq_) || !pass_number(at, to)) return;
     if (is_unfinished(at.header)) {
         to.found({reader::finding::severity::loss, at.offset,
                   fmt::format("this record was never completed by its writer (sequence number {})", at.header.seq),

@@ -8,6 +8,7 @@
 #include <dlfcn.h>
 #include <filesystem>
 #include <functional>
+#include <memory>
 #include <sys/syscall.h>
 #include <unistd.h>
 
@@ -57,7 +58,6 @@ constexpr unsigned longest_seconds = 60;
 // Header words, by their offsets.
 constexpr size_t version = 2;
 constexpr size_t ring_offset = 8;
-constexpr size_t tail_request = 16;
 constexpr size_t file_size = 20;
 constexpr size_t page_state = 192;
 
@@ -158,8 +158,12 @@ INSTANTIATE_TEST_SUITE_P(Values, HostileRingOffset,
 TEST_F(HostileWord, DoesNotSendARecordThatFitsNowhereRoundThePages)
 {
     make_page_set();
-    const auto request_everywhere = [this](int) {
-        qn::tr::for_each_page(&anchors, [](trace_anchor_t *page) { poke(page, tail_request, 1); });
+    std::vector<std::unique_ptr<tail_reader>> readers;
+    qn::tr::for_each_page(&anchors, [&](const trace_anchor_t *page) {
+        readers.push_back(std::make_unique<tail_reader>(page->fileName));
+    });
+    const auto request_everywhere = [&](int) {
+        for (const auto &reader : readers) reader->set_u32(tail_reader::tail_request, 1);
     };
     on_sleep(request_everywhere);
     request_everywhere(0);
@@ -193,17 +197,18 @@ TEST_F(HostileWord, InTheFirstRecordOfAFreshRingCostsOneRecord)
 TEST_F(HostileWord, InAQueuedPagesStateMakesNoThreadSpin)
 {
     make_page_set();
+    tail_reader other_process(anchors.fileName);
     pthread_mutex_lock(&spq.mutex);
     fill(&anchors);
-    qn::tr::store_relaxed(anchors.pMap[page_state], 0xFF);
+    other_process.set_u32(page_state, 0xFF);
     pthread_mutex_unlock(&spq.mutex);
     while (moments < 20) sched_yield();
     {
         const qn::tr::mutex_lock queue(spq.mutex);
         EXPECT_EQ(spq.cnt, 1);
-        qn::tr::store_relaxed(anchors.pMap[page_state], 2);
     }
+    other_process.set_u32(page_state, 2);
     wait_for_queue();
-    EXPECT_EQ(anchors.pMap[page_state], 4);
+    EXPECT_EQ(other_process.u32(page_state), 4U);
 }
 } // namespace

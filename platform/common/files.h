@@ -8,33 +8,20 @@
 #include <cerrno>
 #include <cstddef>
 #include <fcntl.h>
-#include <pthread.h>
 #include <span>
 #include <unistd.h>
 
+#include "platform/common/descriptors.h"
+
 namespace qn::platform
 {
-class no_cancel
-{
-public:
-    no_cancel() { pthread_setcancelstate(PTHREAD_CANCEL_DISABLE, &before_); }
-    no_cancel(const no_cancel &) = delete;
-    no_cancel &operator=(const no_cancel &) = delete;
-    ~no_cancel() { pthread_setcancelstate(before_, nullptr); }
-
-private:
-    int before_ = PTHREAD_CANCEL_ENABLE;
-};
-
 // An open file; closed when it goes out of scope. Used under a no_cancel guard only.
 class file
 {
 public:
     file(const char *path, int flags, mode_t mode = 0)
+        : fd_(open_file(path, flags, mode)), error_(fd_ == -1 ? errno : 0)
     {
-        do fd_ = open(path, flags | O_CLOEXEC, mode);
-        while (fd_ == -1 && errno == EINTR);
-        error_ = fd_ == -1 ? errno : 0;
     }
     file(const file &) = delete;
     file &operator=(const file &) = delete;
@@ -47,15 +34,15 @@ public:
     int fd() const { return fd_; }
 
 private:
-    int fd_ = -1;
-    int error_ = 0;
+    int fd_;
+    int error_;
 };
 
 // Fills `buffer` from the start of a file, up to its end or the buffer's. Returns 0 with *length set, or errno.
 inline int read_file(const char *path, std::span<char> buffer, size_t *length)
 {
     const no_cancel whole;
-    const file source(path, O_RDONLY | O_NOCTTY);
+    const file source(path, O_RDONLY);
     if (source.error() != 0) return source.error();
     size_t have = 0;
     while (have < buffer.size()) {

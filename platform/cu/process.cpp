@@ -40,7 +40,7 @@ bool number_in(const char *line, gid_t *gid)
 
 int find_admin_group(gid_t *gid)
 {
-    const std::unique_ptr<FILE, close_stream> groups(std::fopen(group_file, "re"));
+    const std::unique_ptr<FILE, close_stream> groups(platform::open_text(group_file));
     if (groups == nullptr) return errno;
     char piece[512]; // of a line: that of a group with many members comes in several
     bool at_line_start = true;

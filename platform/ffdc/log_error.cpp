@@ -49,6 +49,7 @@ void write_system_log(const failure &what)
 {
     const std::string component = one_line_or_nothing(what.component);
     const std::string text = one_line_or_nothing(what.text);
+    const platform::standard_numbers_taken other_numbers;
     syslog(priority_of(what.log_event), "%s: error %d: %s (failure id %s)", component.c_str(), what.error_id,
            text.c_str(), what.id);
 }

@@ -44,8 +44,8 @@ int append_record(const char *component, const std::string &record)
     struct stat folder;
     if (stat(std::string(record_folder).c_str(), &folder) != 0) return errno == ENOENT || errno == ENOTDIR ? 0 : errno;
     // Not through a link, and not into a pipe that nobody reads: others may be able to write into the folder.
-    const platform::file out(record_path(component).c_str(),
-                             O_WRONLY | O_APPEND | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY, 0640);
+    const platform::file out(record_path(component).c_str(), O_WRONLY | O_APPEND | O_CREAT | O_NOFOLLOW | O_NONBLOCK,
+                             0640);
     return out.error() != 0 ? out.error() : write_once(out.fd(), record);
 }
 } // namespace qn::ffdc

@@ -70,19 +70,33 @@ private:
         __ptrace_syscall_info info{};
         ptrace(PTRACE_GET_SYSCALL_INFO, thread, sizeof info, &info);
         if (info.op == PTRACE_SYSCALL_INFO_ENTRY)
-            at_entry(thread, static_cast<long>(info.entry.nr));
-        else if (info.op == PTRACE_SYSCALL_INFO_EXIT && thread == target_)
-            at_exit(thread);
+            at_entry(thread, info);
+        else if (info.op == PTRACE_SYSCALL_INFO_EXIT)
+            at_return(thread, info.exit.rval);
     }
 
-    void at_entry(pid_t thread, long number)
+    void at_return(pid_t thread, int64_t result)
     {
+        const auto entered = entered_.find(thread);
+        if (entered == entered_.end()) return;
+        seen_.returned.push_back(entered->second);
+        seen_.returned.back().result = result;
+        entered_.erase(entered);
+        if (thread == target_) at_exit(thread);
+    }
+
+    void at_entry(pid_t thread, const __ptrace_syscall_info &info)
+    {
+        const auto number = static_cast<long>(info.entry.nr);
         if (number == begin_mark) watching_ = true;
         if (number == end_mark) {
             watching_ = false;
             over_ = target_ == 0;
         }
-        if (!watching_ || !is_watched(number)) return;
+        if (!watching_) return;
+        const auto &with = info.entry.args;
+        entered_[thread] = {number, {with[0], with[1], with[2], with[3], with[4], with[5]}, 0};
+        if (!is_watched(number)) return;
         seen_.calls.push_back(number);
         if (seen_.calls.size() == with_.number && with_.what != intervention::nothing) intervene(thread, number);
     }
@@ -118,6 +132,7 @@ private:
     pid_t child_;
     intervention with_;
     watched seen_;
+    std::map<pid_t, returned_call> entered_; // calls that threads are inside of
     bool watching_ = false;
     bool over_ = false;
     pid_t target_ = 0; // the thread inside the system call that is intervened in

@@ -19,10 +19,18 @@ struct intervention {
     int error = 0;
 };
 
+// A system call that came back.
+struct returned_call {
+    long number;
+    uint64_t arguments[6];
+    int64_t result;
+};
+
 // A process that was watched.
 struct watched {
-    bool possible = true;    // false: no process may be traced here
-    std::vector<long> calls; // of the stretch, without those that no file or memory depends on
+    bool possible = true;                // false: no process may be traced here
+    std::vector<long> calls;             // of the stretch, without those that no file or memory depends on
+    std::vector<returned_call> returned; // of the stretch, all of them
     bool intervened = false;
     int ended_by = 0; // wait status
 };

@@ -103,7 +103,9 @@ TEST(House, NoFileOfTheLibraryOutgrowsItsRoom)
         EXPECT_LE(lines_of(file).size(), most_lines) << file;
 }
 
-TEST(House, EveryFileIsOpenedSoThatAnExecutedProgramDoesNotGetIt)
+// By a function that never gives a file the number of a standard stream; only a thread that has a table of descriptors of
+// its own may do without.
+TEST(House, EveryFileIsOpenedInOnePlaceSoThatAnExecutedProgramDoesNotGetIt)
 {
     const std::regex opening(R"(\b(?:open|openat|openat2|creat|fopen|freopen|mkstemp|mkostemp|pipe|dup|socket)\()");
     const std::regex closed_on_exec(R"(O_CLOEXEC|fopen\([^"]*"[a-z]*e[a-z]*")");
@@ -113,8 +115,10 @@ TEST(House, EveryFileIsOpenedSoThatAnExecutedProgramDoesNotGetIt)
             if (line.find("//") != std::string::npos || !std::regex_search(line, opening)) continue;
             ++openings;
             EXPECT_TRUE(std::regex_search(line, closed_on_exec)) << file << ": " << line;
+            const std::string name = file.filename();
+            EXPECT_TRUE(name == "descriptors.h" || name == "spool_thread.cpp") << file << ": " << line;
         }
-    EXPECT_GE(openings, 5U);
+    EXPECT_GE(openings, 4U);
 }
 
 TEST(House, NothingIsMarkedAsUnfinished)

@@ -9,6 +9,7 @@
 #include <qn_cu.h>
 #include <qn_ffdc.h>
 
+#include "platform/common/descriptors.h"
 #include "trace/trace_etbl.h"
 #include "trace/trapi_set.h"
 
@@ -38,7 +39,11 @@ int record_error(int error_code, int msg_code, int number, const char *string)
 class open_catalogue
 {
 public:
-    explicit open_catalogue(const char *name) : catd_(catopen(name, NL_CAT_LOCALE)) {}
+    explicit open_catalogue(const char *name)
+    {
+        const qn::platform::standard_numbers_taken other_numbers;
+        catd_ = catopen(name, NL_CAT_LOCALE);
+    }
     open_catalogue(const open_catalogue &) = delete;
     open_catalogue &operator=(const open_catalogue &) = delete;
     ~open_catalogue()
@@ -65,6 +70,7 @@ void log_trc_error(const char *err_str, char opt)
 {
     const time_t now = time(nullptr);
     char text[64];
+    const qn::platform::standard_numbers_taken other_numbers; // than that of the time zone's file
     if (ctime_r(&now, text) == nullptr) text[0] = '\0';
     std::fprintf(stderr, "%s%c:%s", text, opt, err_str);
 }

@@ -11,7 +11,7 @@
 #include <sys/vfs.h>
 #include <unistd.h>
 
-#include "trace/files/close.h"
+#include "platform/common/descriptors.h"
 #include "trace/files/debug.h"
 #include "trace/files/error_report.h"
 #include "trace/files/library.h"
@@ -56,7 +56,7 @@ public:
     void opened(int fd) { anchor_->mapFd = fd_ = fd; }
     void close_descriptor()
     {
-        if (fd_ != -1) close_for_sure(fd_);
+        if (fd_ != -1) qn::platform::close_for_sure(fd_);
         anchor_->mapFd = fd_ = -1;
     }
     qn_int32_t failed(qn_int32_t status)
@@ -74,10 +74,7 @@ private:
 
 qn_int32_t open_file(trace_anchor_t *anchor, start_in_progress &start)
 {
-    int fd = -1;
-    do {
-        fd = open(anchor->fileName, O_RDWR | O_CREAT | O_CLOEXEC | O_NOCTTY, 0600);
-    } while (fd == -1 && errno == EINTR);
+    const int fd = qn::platform::open_file(anchor->fileName, O_RDWR | O_CREAT, 0600, qn::platform::standard_output);
     if (fd != -1) {
         start.opened(fd);
         return 0;
@@ -162,7 +159,7 @@ void log_start(const trace_anchor_t *anchor)
     gettimeofday(&now, nullptr);
     tm local{};
     char text[64] = "";
-    if (localtime_r(&now.tv_sec, &local) != nullptr) strftime(text, sizeof text, "%F %T", &local);
+    if (qn::platform::local_time(now.tv_sec, local)) strftime(text, sizeof text, "%F %T", &local);
     debug(" +++ %s (%u) started at %s.%ld\n", anchor->fileName, anchor->uActualFileSize, text,
           static_cast<long>(now.tv_usec));
 }
@@ -175,7 +172,7 @@ void cancel_start_trace(void *pArg)
     trace_anchor_t *anchor = anchor_being_opened(fd);
     if (anchor != nullptr && anchor->pMap != nullptr) unmap_page(anchor);
     // Descriptor 0 is left open: it may be the client's own standard input.
-    if (fd != 0) close_for_sure(fd);
+    if (fd != 0) qn::platform::close_for_sure(fd);
 }
 
 qn_int32_t start_trace_page(trace_anchor_t *anchor)

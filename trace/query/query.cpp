@@ -10,14 +10,14 @@
 #include <sys/vfs.h>
 #include <unistd.h>
 
-#include "trace/files/close.h"
+#include "platform/common/descriptors.h"
 #include "trace/files/error_report.h"
 #include "trace/files/format.h"
 #include "trace/files/shared_words.h"
 
 namespace
 {
-using qn::tr::close_for_sure;
+using qn::platform::close_for_sure;
 using qn::tr::load_relaxed;
 
 constexpr char valid_id[4] = {'_', 'T', 'R', '_'};
@@ -57,9 +57,7 @@ private:
 
 qn_int32_t open_file(const char *file_name, qn_int32_t &fd)
 {
-    do {
-        fd = open(file_name, O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK);
-    } while (fd == -1 && errno == EINTR);
+    fd = qn::platform::open_file(file_name, O_RDONLY | O_NONBLOCK, 0, qn::platform::standard_output);
     if (fd != -1) return 0;
     if (errno == EFAULT || errno == EINVAL) return set_error_str(QN_TR_EFILENAME, 17, file_name);
     return set_error_int(QN_TR_EOPEN, 18, errno);

@@ -1,6 +1,7 @@
 // The local time zone, for a file's header.
 #include "trace/recording/time_zone.h"
 
+#include "platform/common/descriptors.h"
 #include "trace/recording/recording.h"
 
 int get_tz_offset(void)
@@ -8,7 +9,7 @@ int get_tz_offset(void)
     const time_t now = time(nullptr);
     tm local{};
     tm greenwich{};
-    if (localtime_r(&now, &local) == nullptr || gmtime_r(&now, &greenwich) == nullptr) return -1;
+    if (!qn::platform::local_time(now, local) || gmtime_r(&now, &greenwich) == nullptr) return -1;
     return qn::tr::zone_minutes(greenwich, local);
 }
 

@@ -13,7 +13,7 @@
 #include <sys/time.h>
 #include <unistd.h>
 
-#include "trace/files/close.h"
+#include "platform/common/descriptors.h"
 #include "trace/files/debug.h"
 #include "trace/files/error_report.h"
 #include "trace/files/library.h"
@@ -36,7 +36,7 @@ public:
     descriptor &operator=(const descriptor &) = delete;
     ~descriptor()
     {
-        if (fd_ != -1) close_for_sure(fd_);
+        if (fd_ != -1) qn::platform::close_for_sure(fd_);
     }
     int get() const { return fd_; }
     int release()
@@ -50,14 +50,6 @@ private:
     int fd_;
 };
 
-int open_retrying(const char *file_name, int flags)
-{
-    int fd = -1;
-    do {
-        fd = open(file_name, flags | O_CLOEXEC | O_NOCTTY, copy_mode);
-    } while (fd == -1 && errno == EINTR);
-    return fd;
-}
 
 // Records why a file could not be opened.
 qn_int32_t open_failed(const char *file_name, bool for_writing)
@@ -69,7 +61,7 @@ qn_int32_t open_failed(const char *file_name, bool for_writing)
 
 qn_int32_t copy_contents(const char *from_name, int to)
 {
-    const descriptor from(open_retrying(from_name, O_RDONLY));
+    const descriptor from(qn::platform::open_file(from_name, O_RDONLY));
     if (from.get() == -1) return open_failed(from_name, false);
     const std::unique_ptr<void, releases<std::free>> buffer(std::malloc(copy_chunk_bytes));
     if (buffer == nullptr) return set_error(QN_TR_ENOMEM, 14);
@@ -108,7 +100,7 @@ void name_copy(std::array<char, size> &path, const copy_job &job)
     gettimeofday(&now, nullptr);
     tm local{};
     std::array<char, 256> time_text{};
-    if (localtime_r(&now.tv_sec, &local) != nullptr)
+    if (qn::platform::local_time(now.tv_sec, local))
         strftime(time_text.data(), time_text.size(), "%Y_%m_%d_%H_%M_%S", &local);
     const char *slash = std::strrchr(job.file_name, '/');
     std::snprintf(path.data(), path.size(), "%s/%s.%s.%2d", job.directory, slash != nullptr ? slash + 1 : job.file_name,
@@ -139,7 +131,7 @@ qn_int32_t cp_mapped_file(const char *dest, const char *fname_in, const void *ma
     else
         debug("cp_mapped_file: %s - from %s\n", dest, fname_in);
 
-    const descriptor to(open_retrying(dest, O_RDWR | O_CREAT | O_TRUNC));
+    const descriptor to(qn::platform::open_file(dest, O_RDWR | O_CREAT | O_TRUNC, copy_mode));
     if (to.get() == -1) return open_failed(dest, true);
     size_t written = 0;
     const qn_int32_t status =
@@ -166,7 +158,7 @@ qn_int32_t map_file(const char *fileName, size_t *size, void **map, int *fd)
     *size = 0;
     *map = nullptr;
     *fd = -1;
-    descriptor file(open_retrying(fileName, O_RDONLY));
+    descriptor file(qn::platform::open_file(fileName, O_RDONLY));
     if (file.get() == -1) return open_failed(fileName, false);
     struct stat status;
     if (fstat(file.get(), &status) != 0) return set_error_int(QN_TR_EFSTAT, 19, errno);

@@ -2,12 +2,18 @@
 //
 // It holds the queue mutex all the time, except while it waits and while it works under the locks that come before that
 // one: the global mutex and set locks, for the configuration and for syncing.
+//
+// It has descriptors of its own. A program that makes itself a daemon closes all of them, at a time of its own choosing,
+// and opens its files under the same numbers: with shared ones, the rest of a copy would be written into such a file.
 #include <csignal>
 #include <cstdlib>
 #include <ctime>
+#include <fcntl.h>
 #include <pthread.h>
 #include <sys/mman.h>
+#include <unistd.h>
 
+#include "platform/common/descriptors.h"
 #include "trace/files/debug.h"
 #include "trace/files/library.h"
 #include "trace/files/locks.h"
@@ -53,6 +59,31 @@ public:
 private:
     sigset_t before_;
 };
+
+// What tells cp_thread that it is the spool thread's body, and that the thread may have descriptors of its own. The
+// connection to the system log has a number that the C library remembers for all threads: who asked for lines there, for
+// servicing the library, has one table for all of them. A sanitizer follows descriptors by their numbers.
+constexpr bool is_sanitized =
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+    true;
+#else
+    false;
+#endif
+char own_descriptors;
+void *argument_for_thread()
+{
+    return is_sanitized || std::getenv("QN_TR_DEBUG_LEVEL") != nullptr ? nullptr : &own_descriptors;
+}
+
+// Leaves the process's table of descriptors for an empty one, in which nothing of the program's stays open either. The
+// standard numbers lead nowhere. A kernel that cannot do it leaves the thread with the process's table.
+void leave_descriptors_to_program()
+{
+    if (close_range(0, ~0U, CLOSE_RANGE_UNSHARE) != 0) return;
+    int number = 0;
+    do number = open("/dev/null", O_RDWR | O_CLOEXEC);
+    while (number != -1 && number < qn::platform::standard_error);
+}
 
 // The default trace's interval, whatever the other traces have.
 qn_uint32_t seconds_to_wait()
@@ -150,7 +181,7 @@ void mk_sp_thread(void)
 {
     pthread_t thread = 0;
     const signals_blocked until_it_blocks_them_itself;
-    if (pthread_create(&thread, nullptr, cp_thread, nullptr) != 0) {
+    if (pthread_create(&thread, nullptr, cp_thread, argument_for_thread()) != 0) {
         debug("ERROR: cannot create spooling thread.\n");
         return;
     }
@@ -158,8 +189,9 @@ void mk_sp_thread(void)
     pthread_detach(thread);
 }
 
-void *cp_thread(void *)
+void *cp_thread(void *argument)
 {
+    if (argument == &own_descriptors) leave_descriptors_to_program();
     store_release(is_spool_running, 1);
     debug("Start cp_thread...\n");
     cu_block_thread_allsig_except_syncsig_1();

@@ -10,6 +10,7 @@
 #include <string>
 #include <strings.h>
 
+#include "platform/common/descriptors.h"
 #include "trace/files/error_report.h"
 #include "trace/files/releases.h"
 #include "trace/files/text.h"
@@ -218,8 +219,7 @@ qn_int32_t conf_parser::finish()
 
 qn_int32_t read_conf_file(const char *file_name, trace_raw_config_t **config, conf_findings *findings)
 {
-    // "c": reading is no cancellation point, so that a cancelled thread leaves no stream behind.
-    const file_ptr file(std::fopen(file_name, "rce"));
+    const file_ptr file(platform::open_text(file_name));
     if (file == nullptr) return QN_TR_ECONFOPEN;
     const conf_patterns patterns;
     qn_int32_t status = patterns.status();

@@ -50,7 +50,6 @@ private:
     int fd_;
 };
 
-
 // Records why a file could not be opened.
 qn_int32_t open_failed(const char *file_name, bool for_writing)
 {

@@ -21,11 +21,7 @@ int unlockGlobalMutex(void) { return pthread_mutex_unlock(&anchors.anchorMutex);
 
 void mutex_cleanup(void *mutex) { pthread_mutex_unlock(static_cast<pthread_mutex_t *>(mutex)); }
 
-int lock_anchor_set(trace_anchor_t *anchor)
-{
-    pthread_mutex_t *taken = nullptr;
-    return qn::tr::take_anchor_set(anchor, taken);
-}
+int lock_anchor_set(trace_anchor_t *anchor) { return qn::tr::take_anchor_set(anchor).result; }
 
 int unlock_anchor_set(trace_anchor_t *anchor) { return pthread_mutex_unlock(qn::tr::anchor_set_mutex(anchor)); }
 

@@ -161,13 +161,18 @@ inline int lock_briefly_held(pthread_mutex_t *mutex)
 
 // Takes the anchor set lock and tells which mutex that was; the lock's result. A start may turn a single file into a
 // page set, whose lock is another one, while a thread waits: so it looks again when it has the mutex.
-inline int take_anchor_set(trace_anchor_t *anchor, pthread_mutex_t *&taken)
+struct taken_mutex {
+    pthread_mutex_t *mutex;
+    int result;
+};
+
+inline taken_mutex take_anchor_set(trace_anchor_t *anchor)
 {
     for (;;) {
-        taken = anchor_set_mutex(anchor);
-        const int result = lock_briefly_held(taken);
-        if (__builtin_expect(result != 0 || taken == anchor_set_mutex(anchor), 1)) return result;
-        pthread_mutex_unlock(taken);
+        pthread_mutex_t *mutex = anchor_set_mutex(anchor);
+        const int result = lock_briefly_held(mutex);
+        if (__builtin_expect(result != 0 || mutex == anchor_set_mutex(anchor), 1)) return {mutex, result};
+        pthread_mutex_unlock(mutex);
     }
 }
 
@@ -175,20 +180,19 @@ inline int take_anchor_set(trace_anchor_t *anchor, pthread_mutex_t *&taken)
 class anchor_set_lock
 {
 public:
-    explicit anchor_set_lock(trace_anchor_t *anchor) : result_(take_anchor_set(anchor, mutex_)) {}
+    explicit anchor_set_lock(trace_anchor_t *anchor) : taken_(take_anchor_set(anchor)) {}
     anchor_set_lock(const anchor_set_lock &) = delete;
     anchor_set_lock &operator=(const anchor_set_lock &) = delete;
     ~anchor_set_lock()
     {
-        if (result_ == 0) pthread_mutex_unlock(mutex_);
+        if (taken_.result == 0) pthread_mutex_unlock(taken_.mutex);
     }
-    explicit operator bool() const { return result_ == 0; }
-    int result() const { return result_; }
+    explicit operator bool() const { return taken_.result == 0; }
+    int result() const { return taken_.result; }
 
 private:
     guard_mark mark_;
-    pthread_mutex_t *mutex_ = nullptr;
-    int result_;
+    taken_mutex taken_;
 };
 
 // Makes every lock free again in a forked child, where the threads that held them do not exist.

@@ -40,9 +40,8 @@ __attribute__((no_sanitize("address"))) inline void copy_component_id(char *to, 
 {
     struct [[gnu::packed, gnu::may_alias]] word { qn_uint32_t bytes; };
     constexpr uintptr_t memory_page = 4096;
-    const uintptr_t room = memory_page - reinterpret_cast<uintptr_t>(from) % memory_page;
     qn_uint32_t bytes = 0;
-    if (__builtin_expect(room >= sizeof bytes, 1)) {
+    if (__builtin_expect(reinterpret_cast<uintptr_t>(from) % memory_page <= memory_page - sizeof bytes, 1)) {
         bytes = reinterpret_cast<const word *>(from)->bytes;
     } else {
         for (unsigned i = 0; i < sizeof bytes && from[i] != '\0'; ++i)

@@ -106,6 +106,7 @@ inline void stamp(trace_record_header_t *record)
             return record;
         }
     }
-    return allocate_space(anchor, &requested);
+    unsigned int wanted = requested; // so that `requested` itself stays in a register
+    return allocate_space(anchor, &wanted);
 }
 } // namespace qn::tr

@@ -116,11 +116,32 @@ struct formatted_writer : record_writer {
 };
 } // namespace
 
+// The forms forward to the main writer through the exported names, so that an application that replaces one of those
+// changes these too. Nearly always nobody has: then the calls through the table of imported names are left out.
+extern "C" {
+[[gnu::visibility("hidden"), gnu::alias("tr_record_strings_v_1")]] qn_int32_t
+own_strings_v(const qn_char_t *, qn_uint32_t, qn_uint32_t, va_list);
+[[gnu::visibility("hidden"), gnu::alias("tr_ms_record_strings_v_1")]] qn_int32_t
+own_ms_strings_v(const qn_char_t *, qn_uint32_t, tr_file_token_t, qn_uint32_t, va_list);
+}
+
+namespace
+{
+// Known when the library is loaded: all its names are bound then.
+const bool strings_are_own = tr_record_strings_v_1 == own_strings_v && tr_ms_record_strings_v_1 == own_ms_strings_v;
+
+[[gnu::always_inline]] inline qn_int32_t write_strings(const qn_char_t *comp_id, qn_uint32_t trace_id,
+                                                       tr_file_token_t token, qn_uint32_t number, va_list args)
+{
+    strings_writer writer(trace_id, number, args);
+    return write_record(comp_id, token, writer);
+}
+} // namespace
+
 qn_int32_t tr_ms_record_strings_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
                                     qn_uint32_t numStrings, va_list args)
 {
-    strings_writer writer(traceId, numStrings, args);
-    return write_record(pCompId, fileToken, writer);
+    return write_strings(pCompId, traceId, fileToken, numStrings, args);
 }
 
 qn_int32_t tr_record_strings_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint32_t numStrings, va_list args)
@@ -142,7 +163,9 @@ qn_int32_t tr_record_strings_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn
 {
     va_list args;
     va_start(args, numStrings);
-    const qn_int32_t status = tr_record_strings_v_1(pCompId, traceId, numStrings, args);
+    const qn_int32_t status = __builtin_expect(strings_are_own, 1)
+                                  ? write_strings(pCompId, traceId, nullptr, numStrings, args)
+                                  : tr_record_strings_v_1(pCompId, traceId, numStrings, args);
     va_end(args);
     return status;
 }

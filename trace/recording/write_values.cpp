@@ -1,4 +1,5 @@
 // Records of 32-bit and 64-bit values.
+#include <array>
 #include <cstdarg>
 #include <cstring>
 
@@ -21,10 +22,17 @@ struct listed_values {
     }
 };
 
-template <class Value>
+// All of them nearly always; fewer when the ring is tiny.
+template <class Value, size_t Count>
 struct given_values {
-    const Value *values;
-    void copy_to(unsigned char *place, qn_uint32_t number) { std::memcpy(place, values, number * sizeof(Value)); }
+    std::array<Value, Count> values;
+    void copy_to(unsigned char *place, qn_uint32_t number)
+    {
+        if (__builtin_expect(number == Count, 1))
+            std::memcpy(place, values.data(), Count * sizeof(Value));
+        else
+            std::memcpy(place, values.data(), number * sizeof(Value));
+    }
 };
 
 // Writes values straight from their source into the file.
@@ -71,8 +79,8 @@ qn_int32_t write_listed(const qn_char_t *comp_id, qn_uint32_t trace_id, tr_file_
 template <class Value, format::kind Function, class... Given>
 qn_int32_t write_given(const qn_char_t *comp_id, qn_uint32_t trace_id, Given... given)
 {
-    const Value values[] = {static_cast<Value>(given)...};
-    values_writer<Value, Function, given_values<Value>> writer(trace_id, sizeof...(given), {values});
+    using source = given_values<Value, sizeof...(given)>;
+    values_writer<Value, Function, source> writer(trace_id, sizeof...(given), source{{static_cast<Value>(given)...}});
     return write_record(comp_id, nullptr, writer);
 }
 

@@ -5,6 +5,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <new>
+#include <optional>
 #include <string_view>
 
 #include "trace/components/component.h"
@@ -108,18 +109,21 @@ int append_pair(Node *&first, Node *&last, const pattern_pair &pair)
 }
 
 // Calls apply(component, i) for every category i that a node's patterns match, of all components on the anchor's list or
-// of `target` alone. Patterns that do not compile match nothing.
+// of `target` alone. Patterns that do not compile match nothing. Compiling is most of the work: the pattern for categories
+// is compiled when a component matches, which of many specifications most do not.
 template <class Node, class Apply>
 void for_each_match(const trace_anchor_t *anchor, const Node *node, component_anchor_t *target, Apply apply)
 {
     const compiled_pattern component_pattern(node->pCompId);
-    const compiled_pattern category_pattern(node->pCategory);
-    if (!component_pattern || !category_pattern) return;
+    if (!component_pattern) return;
+    std::optional<compiled_pattern> category_pattern;
     for (component_anchor_t *component = anchor->pFirstComp; component != nullptr; component = component->pNext) {
         if (target != nullptr && component != target) continue;
         if (!component_pattern.matches(component->compId)) continue;
+        if (!category_pattern) category_pattern.emplace(node->pCategory);
+        if (!*category_pattern) return;
         for (int i = 0; i < component->numberOfCategories; ++i)
-            if (category_pattern.matches(component->categories[i].category_name)) apply(component, i);
+            if (category_pattern->matches(component->categories[i].category_name)) apply(component, i);
     }
 }
 } // namespace qn::tr

@@ -35,6 +35,11 @@
  *             and registers tr_term() with atexit().
  * Files       Nobody may truncate a trace file that a running program traces to: the program's next record there
  *             would end it with SIGBUS. Remove or rename the file instead.
+ *             One process at a time writes a trace file or page set. Two that do it at once overwrite each other's
+ *             records, some of them without a trace; neither is harmed otherwise, and the next one that starts the
+ *             trace goes on with it. Within a process a file is one trace: one that is to be started while it is in
+ *             use under another name - a link to it, "./f" for "f", a page of a page set - is refused with
+ *             QN_TR_EOPEN (error EBUSY), and nothing is recorded there until a control function starts it again.
  * Stopped     After tr_term(), and in a forked child, tracing is stopped for good. The writers, tr_set_multipage_1,
  *             tr_set_file_map_1 and the size functions then return 0 and do nothing.
  */
@@ -71,7 +76,7 @@ enum {
     QN_TR_ECOMPREGEX = 15,     /* specification: component pattern is no regular expression */
     QN_TR_ECATREGEX = 16,      /* specification: category pattern is no regular expression */
     QN_TR_EFILENAME = 17,      /* file name invalid, or no such trace file is known */
-    QN_TR_EOPEN = 18,          /* the file could not be opened */
+    QN_TR_EOPEN = 18,          /* the file could not be opened, or is in use under another name */
     QN_TR_EFSTAT = 19,         /* fstat() failed, or the file system cannot hold trace files */
     QN_TR_ENOTREG = 20,        /* not a regular file */
     QN_TR_EMMAP = 21,          /* mmap() failed */

@@ -1,5 +1,6 @@
 // Another process stores whatever it likes into the trace files of a program that records into them with eight threads.
-// Behind each mapping lies memory that nobody may touch, and a wait for a reader takes no time here: what would hang, hangs.
+// Behind each mapping lies memory that nobody may touch, and a wait for a reader takes no time here: what would hang,
+// hangs.
 #include <atomic>
 #include <csignal>
 #include <filesystem>

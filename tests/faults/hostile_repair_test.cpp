@@ -197,11 +197,9 @@ TEST_F(HostileWord, InTheFirstRecordOfAFreshRingCostsOneRecord)
 TEST_F(HostileWord, InAQueuedPagesStateMakesNoThreadSpin)
 {
     make_page_set();
-    tail_reader other_process(anchors.fileName);
-    pthread_mutex_lock(&spq.mutex);
-    fill(&anchors);
+    tail_reader other_process(anchors.nextPage->fileName);
     other_process.set_u32(page_state, 0xFF);
-    pthread_mutex_unlock(&spq.mutex);
+    spool_enqueue(nullptr, nullptr, anchors.nextPage, &spq, 0);
     while (moments < 20) sched_yield();
     {
         const qn::tr::mutex_lock queue(spq.mutex);

@@ -1,11 +1,10 @@
-// A queued page in a state that says neither "full" nor "ready": what the spool thread does with it, and how a program
-// can bring it about.
+// A queued page in a state that says neither "full" nor "ready": what the spool thread does with it.
 //
 // A page is queued by the writer that leaves it, in state 2, and the writers of its set enter it again only by taking
 // its element out of the queue, unless it is in state 4. State 4 is set by the spool thread, for an element that it has
-// taken out, and when a file is started, whose elements were all taken out when it was stopped. So within one trace a
-// queued page is in state 2, and queued once. But the state lives in the file: another trace, of this process or of
-// another, that goes by another name for the same file starts it and writes it without knowing this queue.
+// taken out, and when a file is started, whose elements were all taken out when it was stopped. So within one process a
+// queued page is in state 2, and queued once. But the state lives in the file: another process that starts the same trace
+// writes it without knowing this queue (tests/faults/two_processes_test.cpp).
 #include <atomic>
 #include <cstring>
 #include <filesystem>
@@ -24,8 +23,6 @@ using namespace qn::test;
 constexpr uint8_t active = 1;
 constexpr uint8_t full = 2;
 constexpr uint8_t ready = 4;
-
-// ---- The spool thread, with a page set that it knows nothing of but the queue.
 
 class QueuedState : public PageSet
 {
@@ -114,62 +111,5 @@ TEST_F(QueuedState, OtherIsLookedAtAgainWithoutWaiting)
     set_state(2, full);
     wait_for([] { return queued() == 0; });
     EXPECT_EQ(entries_of(copies).size(), 2U);
-}
-
-// ---- Two traces that are the same files, by exported calls alone.
-
-class TwoNames : public testing::Test
-{
-protected:
-    void SetUp() override
-    {
-        setenv("QN_TR_SPOOL", "t$:ON:8:/dev/null", 1);
-        ASSERT_EQ(tr_set_file_map_1((folder / "t").c_str(), "ONE_:c0"), 0);
-        ASSERT_EQ(tr_set_file_map_1((folder.folder() + "//t").c_str(), "TWO_:c0"), 0);
-        ASSERT_EQ(one.register_now(), 0);
-    }
-    void TearDown() override { tr_term(); }
-
-    // Writes to the trace until it has left that many pages.
-    static void leave_pages(client &of, int count)
-    {
-        tr_file_token_t trace = of.tokens[0];
-        while (count-- > 0) {
-            const trace_anchor_t *page = trace->pActivePg;
-            while (trace->pActivePg == page) ASSERT_EQ(tr_ms_record_id_1(of.id.c_str(), 1, trace), 0);
-        }
-    }
-    static uint8_t state_of(const sp_q_element_t *element) { return element->pAnchor->pMap[192]; }
-
-    scratch folder;
-    no_spool_thread none; // what it would find is looked at instead
-    client one{"ONE_"};
-    client two{"TWO_"};
-};
-
-TEST_F(TwoNames, ForOneFileMakeAQueuedPageReady)
-{
-    leave_pages(one, 1);
-    ASSERT_EQ(spq.cnt, 1);
-    ASSERT_EQ(state_of(spq.pLast), full);
-    ASSERT_EQ(two.register_now(), 0);
-    ASSERT_NE(two.tokens[0], one.tokens[0]);
-    EXPECT_EQ(state_of(spq.pLast), ready) << "it is lost without a copy";
-}
-
-TEST_F(TwoNames, ForOneFileMakeAQueuedPageActive)
-{
-    leave_pages(one, 1);
-    ASSERT_EQ(two.register_now(), 0);
-    ASSERT_STREQ(two.tokens[0]->pActivePg->fileName, (folder.folder() + "//t.2.sp").c_str());
-    leave_pages(two, 7);
-    ASSERT_STREQ(two.tokens[0]->pActivePg->fileName, (folder.folder() + "//t.1.sp").c_str());
-    EXPECT_EQ(spq.pLast->pAnchor, one.tokens[0]);
-    EXPECT_EQ(state_of(spq.pLast), active) << "the thread would look at it again and again";
-
-    // It gets on as soon as the page is full once more.
-    leave_pages(two, 1);
-    EXPECT_EQ(spq.pLast->pAnchor, one.tokens[0]);
-    EXPECT_EQ(state_of(spq.pLast), full);
 }
 } // namespace

@@ -1,5 +1,4 @@
-// Whatever a program calls, in whatever order: as long as each trace file has one name, every queued page is full, and
-// queued once. (How two names for one file break that: element_state_test.cpp.)
+// Whatever a program calls, in whatever order: every queued page is full, and queued once.
 #include <filesystem>
 #include <map>
 #include <random>

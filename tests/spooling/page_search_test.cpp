@@ -100,8 +100,8 @@ TEST_F(PageSearch, ComesBackToTheFullPageWhenNoOtherIsMapped)
     EXPECT_EQ(spq.cnt, 0);
 }
 
-// A trace file of its own that goes by a page's name is part of the ring, and not of the set.
-TEST(PageSearchInARing, SkipsATraceThatHasAPagesName)
+// A trace file of its own that goes by a page's name is no part of the ring: its mapping and its records are its own.
+TEST(PageSearchInARing, LeavesOutATraceThatHasAPagesName)
 {
     const scratch folder;
     trace_anchor_t *foreign = anchor_for(folder / "t.2.sp");
@@ -114,16 +114,19 @@ TEST(PageSearchInARing, SkipsATraceThatHasAPagesName)
     head->spool = &spool;
     head->bSpoolProcessed = 1;
     ASSERT_EQ(start(head), 0);
-    ASSERT_EQ(head->nextPage, foreign);
+    ASSERT_EQ(head->nextPage->fileName, folder / "t.3.sp");
+    EXPECT_EQ(head->nextPage->nextPage, head);
+    EXPECT_EQ(foreign->nextPage, nullptr);
     {
         const qn::tr::anchor_set_lock set(head);
         unsigned int length = 32;
         EXPECT_NE(pageFull(head, &length), nullptr);
     }
-    EXPECT_EQ(head->pActivePg, foreign->nextPage);
+    EXPECT_EQ(head->pActivePg, head->nextPage);
     EXPECT_EQ(trace_image::of_file(foreign->fileName).records_of(2).size(), 0U);
     EXPECT_EQ(foreign->pMap[192], 0);
     EXPECT_EQ(qn::tr::become_unbound(head), 0);
+    EXPECT_NE(foreign->pMap, nullptr);
     stop(foreign);
 }
 } // namespace

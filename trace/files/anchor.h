@@ -9,6 +9,7 @@
 #pragma once
 
 #include <pthread.h>
+#include <sys/types.h>
 
 #include <qn_tr.h>
 
@@ -29,9 +30,12 @@ struct trace_anchor {
     int bMultipageEnabled;       // default anchor: traces may be split into pages. Global mutex
     pthread_mutex_t anchorMutex; // recursive; the default anchor's is the global mutex
     int mapFd;                   // while the file is being opened, else -1
-    unsigned char *pMap;         // the file header; null while the file is not mapped
-    unsigned char *pMapEnd;      // one past the mapping
-    qn_uint32_t seqNumber;       // of the last record
+    dev_t fileDevice;            // which file is mapped. Spool queue mutex, as are the following two
+    ino_t fileNode;
+    trace_anchor_t *nextClaimed;
+    unsigned char *pMap;    // the file header; null while the file is not mapped
+    unsigned char *pMapEnd; // one past the mapping
+    qn_uint32_t seqNumber;  // of the last record
     trace_record_header_t *pNextFree;
     trace_record_header_t *pWrap;         // where a lap of the ring begins: behind a page's notice
     trace_record_header_t *pRing;         // start of the ring, as it was found at the start
@@ -86,6 +90,9 @@ namespace qn::tr
 {
 // True when the anchor's file is governed by a specification that is on.
 bool spooling_is_on(const trace_anchor_t *anchor);
+
+// False for a trace file of its own that goes by a page's name.
+bool is_page_of(const trace_anchor_t *page, const trace_anchor_t *head);
 
 // Copies a name into an anchor's field, cut to what it holds.
 void set_file_name(trace_anchor_t *anchor, const char *file_name);

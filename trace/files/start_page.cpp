@@ -16,6 +16,7 @@
 #include "trace/files/error_report.h"
 #include "trace/files/library.h"
 #include "trace/files/locks.h"
+#include "trace/files/mapped_files.h"
 #include "trace/files/text.h"
 #include "trace/files/trace_file.h"
 #include "trace/recording/recording.h"
@@ -49,6 +50,7 @@ public:
     {
         cancel_start_trace(&fd_);
         if (!done_ && anchor_->pMap != nullptr) unmap_page(anchor_);
+        if (!done_) release_file(anchor_);
         anchor_->mapFd = -1;
     }
 
@@ -97,6 +99,7 @@ qn_int32_t check_file(trace_anchor_t *anchor, int fd, qn_uint64_t &current_size)
     const int result = fstat(fd, &file);
     if (result != 0) return set_error_int(QN_TR_EFSTAT, 19, result);
     if (!S_ISREG(file.st_mode)) return set_error_str(QN_TR_ENOTREG, 20, anchor->fileName);
+    if (!claim_file(anchor, file)) return set_error_int(QN_TR_EOPEN, 18, EBUSY);
     current_size = static_cast<qn_uint64_t>(file.st_size);
     return 0;
 }
@@ -239,5 +242,6 @@ void unmap_page(trace_anchor_t *anchor)
     anchor->pRing = nullptr;
     anchor->pNextFree = nullptr;
     anchor->uActualFileSize = 0;
+    release_file(anchor);
 }
 } // namespace qn::tr

@@ -47,17 +47,14 @@ void free_pages(const trace_anchor_t *head, trace_anchor_t *first)
 {
     for (trace_anchor_t *page = first; page != nullptr && page != head;) {
         trace_anchor_t *following = page->nextPage;
-        if (page->p_head_spool_anchor == head) {
-            pthread_mutex_destroy(&page->anchorMutex);
-            std::free(page);
-        } else {
-            store_relaxed(page->nextPage, nullptr); // a trace file of its own that had a page's name
-        }
+        pthread_mutex_destroy(&page->anchorMutex);
+        std::free(page);
         page = following;
     }
 }
 
-// A chain of page anchors from number 2 on, whose last leads to the head; null when memory runs out, which is recorded.
+// A chain of page anchors from number 2 on, whose last leads to the head; null when memory runs out, which is recorded. A
+// number is left out when a trace file of its own goes by that page's name: that one has a lock and a ring of its own.
 trace_anchor_t *new_pages(trace_anchor_t *head, const char *base_name, qn_uint32_t pages)
 {
     trace_anchor_t *first = head;
@@ -71,6 +68,7 @@ trace_anchor_t *new_pages(trace_anchor_t *head, const char *base_name, qn_uint32
             free_pages(head, first);
             return nullptr;
         }
+        if (!is_page_of(page, head)) continue;
         page->nextPage = head;
         (last != nullptr ? last->nextPage : first) = page;
         last = page;

@@ -24,16 +24,13 @@ using namespace qn::tr;
 
 constexpr qn_uint32_t switching_debug_level = 1; // lines are written above it
 
-// A page that is not mapped, because its start failed, or that is a trace file of its own with a page's name, is none.
-bool can_be_written(const trace_anchor_t *page, const trace_anchor_t *full_page)
-{
-    return page->pMap != nullptr && page->ppActivePg == full_page->ppActivePg;
-}
+// A page is not mapped when its start failed.
+bool can_be_written(const trace_anchor_t *page) { return page->pMap != nullptr; }
 
-bool ring_can_be_written(trace_anchor_t *page, const trace_anchor_t *full_page)
+bool ring_can_be_written(trace_anchor_t *page)
 {
     bool any = false;
-    for_each_page(page, [&](const trace_anchor_t *candidate) { any = any || can_be_written(candidate, full_page); });
+    for_each_page(page, [&](const trace_anchor_t *candidate) { any = any || can_be_written(candidate); });
     return any;
 }
 
@@ -135,12 +132,12 @@ trace_record_header_t *pageFull(trace_anchor_t *pAnchor, unsigned int *pReqLengt
         set_error(QN_TR_ENOMEM, 14);
         return nullptr;
     }
-    if (!ring_can_be_written(next, pAnchor)) {
+    if (!ring_can_be_written(next)) {
         spool_dequeue_and_delete_element(&spq, pAnchor); // the next record comes here again
         return nullptr;
     }
     for (;; next = next->nextPage) {
-        if (!can_be_written(next, pAnchor)) continue;
+        if (!can_be_written(next)) continue;
         const mutex_try_lock page_lock(next->anchorMutex);
         if (page_lock) {
             start_writing(next);

@@ -25,12 +25,6 @@ bool may_be_released(trace_anchor_t *page)
     return page->pMap == nullptr || state_of(page) == format::page_state::ready;
 }
 
-// False for a trace file of its own that happens to have a page's name.
-bool is_page_of(const trace_anchor_t *page, const trace_anchor_t *head)
-{
-    return page != head && page->p_head_spool_anchor == head;
-}
-
 void release(trace_anchor_t *page)
 {
     stop_trace_page(page, load_relaxed(this_is_child));
@@ -115,12 +109,10 @@ void cut_ring(trace_anchor_t *head, qn_uint32_t pages)
     while (page != head) {
         trace_anchor_t *following = page->nextPage;
         store_relaxed(page->nextPage, nullptr);
-        if (is_page_of(page, head)) {
-            if (may_be_released(page) && head->pActivePg != page)
-                release(page);
-            else
-                make_obsolete(head, page);
-        }
+        if (may_be_released(page) && head->pActivePg != page)
+            release(page);
+        else
+            make_obsolete(head, page);
         page = following;
     }
 }
@@ -159,7 +151,7 @@ trace_anchor_t *add_new_pages(trace_anchor_t *p_anchor, trace_spool_spec_t *p_ol
         for (trace_anchor_t *page = first_new; page != nullptr;) {
             trace_anchor_t *following = page->nextPage;
             page->nextPage = nullptr;
-            if (is_page_of(page, p_anchor)) make_obsolete(p_anchor, page);
+            make_obsolete(p_anchor, page);
             page = following;
         }
         return nullptr;
@@ -171,6 +163,7 @@ trace_anchor_t *add_new_pages(trace_anchor_t *p_anchor, trace_spool_spec_t *p_ol
         trace_anchor_t *page = take_back(p_anchor, page_name);
         if (page == nullptr) page = getSplAnchor(p_anchor, page_name);
         if (page == nullptr) return give_up();
+        if (!is_page_of(page, p_anchor)) continue;
         start_new_page(p_anchor, page);
         if (last_new != nullptr)
             last_new->nextPage = page;

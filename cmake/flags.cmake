@@ -4,6 +4,10 @@ if(QN_TR_WERROR)
     add_compile_options(-Werror)
 endif()
 
+if(QN_TR_CHECK_LOCK_ORDER)
+    add_compile_definitions(QN_TR_CHECK_LOCK_ORDER)
+endif()
+
 # A thread cancelled inside the library unwinds like an exception: every frame, C ones too, needs its unwind table.
 add_compile_options(-fexceptions -fasynchronous-unwind-tables)
 

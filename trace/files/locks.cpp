@@ -15,15 +15,15 @@ void init_recursive_mutex(pthread_mutex_t *mutex)
     pthread_mutexattr_destroy(&attributes);
 }
 
-int lockGlobalMutex(void) { return pthread_mutex_lock(&anchors.anchorMutex); }
+int lockGlobalMutex(void) { return qn::tr::lock_mutex(&anchors.anchorMutex); }
 
-int unlockGlobalMutex(void) { return pthread_mutex_unlock(&anchors.anchorMutex); }
+int unlockGlobalMutex(void) { return qn::tr::unlock_mutex(&anchors.anchorMutex); }
 
-void mutex_cleanup(void *mutex) { pthread_mutex_unlock(static_cast<pthread_mutex_t *>(mutex)); }
+void mutex_cleanup(void *mutex) { qn::tr::unlock_mutex(static_cast<pthread_mutex_t *>(mutex)); }
 
 int lock_anchor_set(trace_anchor_t *anchor) { return qn::tr::take_anchor_set(anchor).result; }
 
-int unlock_anchor_set(trace_anchor_t *anchor) { return pthread_mutex_unlock(qn::tr::anchor_set_mutex(anchor)); }
+int unlock_anchor_set(trace_anchor_t *anchor) { return qn::tr::unlock_mutex(qn::tr::anchor_set_mutex(anchor)); }
 
 void cleanup_anchor_set(void *anchor) { unlock_anchor_set(static_cast<trace_anchor_t *>(anchor)); }
 
@@ -45,6 +45,7 @@ int lock_busy_mutex(pthread_mutex_t *mutex)
 
 void reset_locks_in_child()
 {
+    forget_all_taken();
     initialize_trace_global_data();
     init_recursive_mutex(&anchors.anchorMutex);
     init_recursive_mutex(&component_list_mutex);

@@ -11,6 +11,8 @@
 //     configuration_file_last_modified_mutex
 //     cluster info mutex      the cache of the cluster's facts
 //
+// Builds for finding faults check this order (lock_ranks.h). A lock may be tried for at any time.
+//
 // All of them are recursive. A guard releases its lock when it goes out of scope, also when the thread is cancelled:
 // cancellation unwinds the stack like an exception. So nothing between a guard and a cancellation point may be noexcept.
 #pragma once
@@ -21,6 +23,7 @@
 #include <sys/single_threaded.h>
 
 #include "trace/files/anchor.h"
+#include "trace/files/lock_ranks.h"
 #include "trace/files/shared_words.h"
 #include "trace/spooling/spool_types.h"
 
@@ -77,11 +80,35 @@ private:
 // Whether the caller interrupts the library on its own thread.
 inline bool interrupts_a_guard() { return guards_of_thread != 0; }
 
+// What everything that takes or releases one of the library's mutexes calls: the checked order knows no other. A mutex
+// without a name of its own is taken for a page's.
+inline int lock_mutex(pthread_mutex_t *mutex, lock_rank rank = lock_rank::page)
+{
+    expect_in_order(mutex, rank);
+    const int result = pthread_mutex_lock(mutex);
+    if (result == 0) note_taken(mutex, rank);
+    return result;
+}
+inline int try_mutex(pthread_mutex_t *mutex)
+{
+    const int result = pthread_mutex_trylock(mutex);
+    if (result == 0) note_taken(mutex, lock_rank::page);
+    return result;
+}
+inline int unlock_mutex(pthread_mutex_t *mutex)
+{
+    note_released(mutex);
+    return pthread_mutex_unlock(mutex);
+}
+
 // Holds a plain mutex. Test it: a lock that could not be taken is not released.
 class mutex_lock
 {
 public:
-    explicit mutex_lock(pthread_mutex_t &mutex) : mutex_(&mutex), result_(pthread_mutex_lock(&mutex)) {}
+    explicit mutex_lock(pthread_mutex_t &mutex, lock_rank rank = lock_rank::page)
+        : mutex_(&mutex), result_(lock_mutex(&mutex, rank))
+    {
+    }
     mutex_lock(const mutex_lock &) = delete;
     mutex_lock &operator=(const mutex_lock &) = delete;
     ~mutex_lock()
@@ -105,10 +132,7 @@ private:
 class mutex_try_lock : public mutex_lock
 {
 public:
-    explicit mutex_try_lock(pthread_mutex_t &mutex) : mutex_lock(mutex, &try_lock) {}
-
-private:
-    static int try_lock(pthread_mutex_t *mutex) { return pthread_mutex_trylock(mutex); }
+    explicit mutex_try_lock(pthread_mutex_t &mutex) : mutex_lock(mutex, &try_mutex) {}
 };
 
 // Holds the global mutex.
@@ -170,9 +194,13 @@ inline taken_mutex take_anchor_set(trace_anchor_t *anchor)
 {
     for (;;) {
         pthread_mutex_t *mutex = anchor_set_mutex(anchor);
+        const lock_rank rank = mutex == &anchor->anchorMutex ? lock_rank::file : lock_rank::set;
+        expect_in_order(mutex, rank);
         const int result = lock_briefly_held(mutex);
-        if (__builtin_expect(result != 0 || mutex == anchor_set_mutex(anchor), 1)) return {mutex, result};
-        pthread_mutex_unlock(mutex);
+        if (__builtin_expect(result != 0, 0)) return {mutex, result};
+        note_taken(mutex, rank);
+        if (__builtin_expect(mutex == anchor_set_mutex(anchor), 1)) return {mutex, 0};
+        unlock_mutex(mutex);
     }
 }
 
@@ -185,7 +213,7 @@ public:
     anchor_set_lock &operator=(const anchor_set_lock &) = delete;
     ~anchor_set_lock()
     {
-        if (taken_.result == 0) pthread_mutex_unlock(taken_.mutex);
+        if (taken_.result == 0) unlock_mutex(taken_.mutex);
     }
     explicit operator bool() const { return taken_.result == 0; }
     int result() const { return taken_.result; }

@@ -33,14 +33,14 @@ void describe(const trace_anchor_t *anchor, tr_mini_spooling_anchor_t &record)
 // The default anchor's mutex is the global one, which the caller holds.
 int lock_anchor(trace_anchor_t *anchor)
 {
-    const int result = anchor != &anchors ? pthread_mutex_lock(&anchor->anchorMutex) : 0;
+    const int result = anchor != &anchors ? lock_mutex(&anchor->anchorMutex) : 0;
     if (result != 0) debug("get_current_spool_info: failed to get mutex: %d\n", result);
     return result;
 }
 
 int unlock_anchor(trace_anchor_t *anchor)
 {
-    const int result = anchor != &anchors ? pthread_mutex_unlock(&anchor->anchorMutex) : 0;
+    const int result = anchor != &anchors ? unlock_mutex(&anchor->anchorMutex) : 0;
     if (result != 0) debug("get_current_spool_info: failed to release mutex: %d\n", result);
     return result;
 }

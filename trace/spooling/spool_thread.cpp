@@ -33,10 +33,10 @@ using namespace qn::tr;
 class unlocked
 {
 public:
-    explicit unlocked(pthread_mutex_t &mutex) : mutex_(mutex) { pthread_mutex_unlock(&mutex_); }
+    explicit unlocked(pthread_mutex_t &mutex) : mutex_(mutex) { unlock_mutex(&mutex_); }
     unlocked(const unlocked &) = delete;
     unlocked &operator=(const unlocked &) = delete;
-    ~unlocked() { pthread_mutex_lock(&mutex_); }
+    ~unlocked() { lock_mutex(&mutex_); }
 
 private:
     pthread_mutex_t &mutex_;

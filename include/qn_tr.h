@@ -186,9 +186,9 @@ QN_EXPORT qn_int32_t tr_unregister_component_1(const qn_char_t *pComponentId);
  * The specification is taken whole or not at all. pLevelString must not be NULL. Returns 0, 9, 14, or
  *   10, 11, 12, 13, 15, 16  a syntax error, with its offset in the message; no level was changed
  *   17 to 23, 35            the last trace file that now has something to trace could not be started
- * The patterns go to regcomp() and regexec() as they are, with the library's global lock held. Nested repetitions and back
- * references can cost seconds and gigabytes, and parentheses nested 100 000 deep the process: do not pass on patterns
- * from people who are not trusted. docs/patterns.md has the figures.
+ * The patterns go to regcomp() and regexec(), with the library's global lock held. One that would take these gigabytes,
+ * minutes or the stack, and one with back references, is refused like one that is no regular expression (15 or 16):
+ * docs/patterns.md tells what is.
  */
 QN_EXPORT qn_int32_t tr_set_trace_levels_1(const qn_char_t *pLevelString);
 

@@ -1,10 +1,12 @@
 // A compiled regular expression, as every pattern of the library is meant: extended, without regard to case, "." and
-// "[^...]" not matching a line feed.
+// "[^...]" not matching a line feed. One that would take too much to compile is treated as if memory had run out.
 #pragma once
 
 #include <cstddef>
 #include <regex.h>
 #include <span>
+
+#include "trace/files/pattern_cost.h"
 
 namespace qn::tr
 {
@@ -13,7 +15,8 @@ class compiled_pattern
 {
 public:
     explicit compiled_pattern(const char *pattern, int flags = REG_NOSUB)
-        : result_(regcomp(&regex_, pattern, REG_EXTENDED | REG_ICASE | REG_NEWLINE | flags))
+        : result_(is_affordable(pattern) ? regcomp(&regex_, pattern, REG_EXTENDED | REG_ICASE | REG_NEWLINE | flags)
+                                         : REG_ESPACE)
     {
     }
     compiled_pattern(const compiled_pattern &) = delete;

@@ -67,7 +67,8 @@ qn_int32_t tr_core_event_1(const char *trc_file, const char *message)
 qn_int32_t int_record_start(trace_anchor_t *pAnchor)
 {
     if (master_override_off() || pAnchor->uMaxSize == 0) return 0;
-    if (gCoreMessage != nullptr && gCoreTrcFile != nullptr && std::strcmp(gCoreTrcFile, pAnchor->fileName) == 0)
+    const char *core_file = load_acquire(gCoreTrcFile);
+    if (load_relaxed(gCoreMessage) != nullptr && core_file != nullptr && std::strcmp(core_file, pAnchor->fileName) == 0)
         return segfault_restart(pAnchor);
     write_own_record<trace_record_start_t>(pAnchor, format::kind::start, sizeof(trace_record_start_t), fill_start);
     return 0;
@@ -76,11 +77,12 @@ qn_int32_t int_record_start(trace_anchor_t *pAnchor)
 qn_int32_t segfault_restart(trace_anchor_t *pAnchor)
 {
     if (pAnchor->uMaxSize == 0) return 0;
-    const size_t text_length = std::strlen(gCoreMessage);
+    const char *message = load_acquire(gCoreMessage);
+    const size_t text_length = std::strlen(message);
     const auto length = static_cast<unsigned int>((text_length + sizeof(trace_record_start_t) + 4) & ~size_t{3});
     write_own_record<trace_record_start_t>(pAnchor, format::kind::restart, length, [=](trace_record_start_t *record) {
         fill_start(record);
-        std::memcpy(record + 1, gCoreMessage, text_length + 1);
+        std::memcpy(record + 1, message, text_length + 1);
     });
     return 0;
 }

@@ -65,7 +65,8 @@ TEST(PatternCost, LetsThroughWhatPeopleWrite)
     }
     EXPECT_TRUE(is_affordable(std::string(100000, 'a')));
     EXPECT_TRUE(is_affordable(nested("a", "", 100)));
-    EXPECT_TRUE(is_affordable("^(" + repeated("COMP|", 300) + "LAST)$"));
+    EXPECT_TRUE(is_affordable("^(" + repeated("COMP|", 1000) + "LAST)$"));
+    EXPECT_TRUE(is_affordable(repeated("^/var/log/.*\\.trc$|", 300) + "\\bmain\\b"));
 }
 
 TEST(PatternCost, RefusesWhatTakesTheMemoryTheTimeOrTheStack)

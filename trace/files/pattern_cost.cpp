@@ -5,15 +5,17 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
+#include <utility>
 
 namespace qn::tr
 {
 namespace
 {
-constexpr uint64_t most_added_items = 65536;        // by repetition: the text itself may be as long as it is
-constexpr uint64_t most_optional = 500;             // and branches
+constexpr uint64_t most_added_items = 65536; // by repetition: the text itself may be as long as it is
+constexpr uint64_t most_alternatives = 2000;
+constexpr uint64_t most_optional = 500;             // and empty branches
 constexpr uint64_t most_optional_beside_those = 50; // anchors and empty rounds
-constexpr uint64_t most_branches_beside_those = 300;
+constexpr uint64_t most_empty_branches_beside_those = 300;
 constexpr uint64_t most_anchors = 16;
 constexpr uint64_t most_repeated_anchors = 4;
 constexpr uint64_t most_empty_rounds = 16;
@@ -22,8 +24,11 @@ constexpr size_t most_levels = 100;
 // All that a part of the expression comes to, with what repetition makes of it.
 struct weight {
     uint64_t items = 0;
-    uint64_t optional = 0; // places that can be passed without a character
-    uint64_t branches = 0; // behind the first one
+    uint64_t alternatives = 0;   // branches that take a character at least
+    uint64_t empty_branches = 0; // those that need not
+    uint64_t optional = 0;       // places that can be passed without a character
+    // Of alternatives the one with the most counts: what is in two of them is never met together.
+    uint64_t optional_in_one = 0;
     uint64_t anchors = 0;
     uint64_t repeated_anchors = 0; // one counts more than twice for every repetition around it
     uint64_t empty_rounds = 0;     // ways through endless repetitions of what may be empty
@@ -32,8 +37,10 @@ struct weight {
     weight &operator+=(const weight &other)
     {
         items += other.items;
+        alternatives += other.alternatives;
+        empty_branches += other.empty_branches;
         optional += other.optional;
-        branches += other.branches;
+        optional_in_one += other.optional_in_one;
         anchors += other.anchors;
         repeated_anchors += other.repeated_anchors;
         empty_rounds += other.empty_rounds;
@@ -42,10 +49,11 @@ struct weight {
     }
     bool is_affordable(uint64_t length) const
     {
-        return items <= length + most_added_items && optional + branches <= most_optional && anchors <= most_anchors &&
+        return items <= length + most_added_items && alternatives <= most_alternatives &&
+               optional + empty_branches <= most_optional && anchors <= most_anchors &&
                repeated_anchors <= most_repeated_anchors && empty_rounds <= most_empty_rounds &&
                (anchors + empty_rounds == 0 ||
-                (optional <= most_optional_beside_those && branches <= most_branches_beside_those));
+                (optional_in_one <= most_optional_beside_those && empty_branches <= most_empty_branches_beside_those));
     }
 };
 
@@ -70,25 +78,50 @@ public:
         while (at_ < pattern_.size()) {
             if (!take_one()) return false;
             // Never so much that the next repetition could make the numbers overflow.
-            weight so_far = levels_[level_].before;
-            so_far += levels_[level_].last;
-            if (!so_far.is_affordable(pattern_.size())) return false;
+            if (!whole(levels_[level_]).is_affordable(pattern_.size())) return false;
         }
         // What is not closed is malformed, but read up to there.
         weight all;
-        for (size_t i = 0; i <= level_; ++i) {
-            all += levels_[i].before;
-            all += levels_[i].last;
-        }
+        for (size_t i = 0; i <= level_; ++i) all += whole(levels_[i]);
         return all.is_affordable(pattern_.size());
     }
 
 private:
     struct level {
-        weight before; // of the parts before the last one
-        weight last;   // which a repetition behind it is about
+        weight branches;                              // those that are complete
+        weight before;                                // of the present branch, the parts before the last one
+        weight last;                                  // which a repetition behind it is about
+        uint64_t most_optional = 0, most_anchors = 0; // in one alternative among the complete branches
         bool has_empty_branch = false;
     };
+
+    static weight present_branch(const level &of)
+    {
+        weight branch = of.before;
+        branch += of.last;
+        return branch;
+    }
+
+    // The level as if it ended here.
+    static weight whole(level of)
+    {
+        add_branch(of, present_branch(of));
+        of.branches.optional_in_one += of.most_optional;
+        of.branches.anchors += of.most_anchors;
+        of.branches.may_be_empty = of.has_empty_branch;
+        return of.branches;
+    }
+
+    static void add_branch(level &to, weight branch)
+    {
+        if (branch.may_be_empty) {
+            to.has_empty_branch = true;
+        } else {
+            to.most_optional = std::max(to.most_optional, std::exchange(branch.optional_in_one, 0));
+            to.most_anchors = std::max(to.most_anchors, std::exchange(branch.anchors, 0));
+        }
+        to.branches += branch;
+    }
 
     bool take_one()
     {
@@ -118,13 +151,13 @@ private:
         now.last = part;
     }
 
-    // What is behind the "|" is another branch; the whole may be empty where one branch may.
     void next_branch()
     {
-        next({.branches = 1});
         level &now = levels_[level_];
-        now.has_empty_branch = now.has_empty_branch || now.before.may_be_empty;
-        now.before.may_be_empty = true;
+        weight branch = present_branch(now);
+        ++(branch.may_be_empty ? branch.empty_branches : branch.alternatives);
+        add_branch(now, branch);
+        now.before = now.last = {};
     }
 
     bool open_group()
@@ -138,10 +171,11 @@ private:
     void close_group()
     {
         if (level_ == 0) return next(one_character); // stands for itself
-        weight group = levels_[level_].before;
-        group += levels_[level_].last;
-        group.may_be_empty = group.may_be_empty || levels_[level_].has_empty_branch;
-        if (group.may_be_empty) ++group.optional;
+        weight group = whole(levels_[level_]);
+        if (group.may_be_empty) {
+            ++group.optional;
+            ++group.optional_in_one;
+        }
         levels_[--level_].last = group;
     }
 
@@ -153,8 +187,10 @@ private:
         if (how.endless && last.may_be_empty) last.empty_rounds = 2 * last.empty_rounds + (last.optional + 1) * copies;
         last.may_be_empty = last.may_be_empty || how.may_be_none;
         last.items *= copies;
-        last.branches *= copies;
+        last.alternatives *= copies;
+        last.empty_branches *= copies;
         last.optional = last.optional * copies + how.optional;
+        last.optional_in_one = last.optional_in_one * copies + how.optional;
         last.repeated_anchors = 2 * copies * (last.repeated_anchors + last.anchors);
         last.anchors *= copies;
     }

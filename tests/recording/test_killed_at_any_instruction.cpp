@@ -1,17 +1,16 @@
 // A writer that is stopped behind each of its instructions: whenever it may be killed, the file holds a sound ring, and
 // in it every record that this call does not overwrite.
-#include <csignal>
 #include <cstdlib>
 #include <functional>
+#include <optional>
 #include <set>
-#include <sys/ptrace.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
 #include <gtest/gtest.h>
 
+#include "faults/campaign.h"
 #include "recording/one_trace.h"
 #include "recording/ring_layout.h"
+#include "recording/single_step.h"
 
 using namespace qn::test;
 
@@ -54,12 +53,12 @@ std::vector<scene> scenes()
 class KilledWriter : public testing::TestWithParam<scene>
 {
 protected:
-    // The writing process: stops itself before the call, and ends behind it.
-    [[noreturn]] void play()
+    // In the writing process.
+    void prepare() const
     {
         setenv("QN_TR_SIZE", std::to_string(file_bytes).c_str(), 1);
         client component("TEST");
-        qn_int32_t status = tr_set_filename_1(file_.c_str()) | component.register_now();
+        if ((tr_set_filename_1(file_.c_str()) | component.register_now()) != 0) std::abort();
         std::vector<planned_record> ring;
         const auto count = static_cast<uint32_t>(GetParam().lengths.size());
         for (uint32_t i = 0; i < count; ++i) {
@@ -67,29 +66,22 @@ protected:
             ring.push_back({GetParam().lengths[i], 1, 100 + 2 * age});
         }
         lay_out(ring, GetParam().oldest, 100 + 2 * (count - 1));
-        if (ptrace(PTRACE_TRACEME, 0, nullptr, nullptr) != 0) _exit(77);
-        raise(SIGSTOP);
-        status |= GetParam().call();
-        _exit(status);
     }
 
     // The file behind each instruction that changed it; the first and the last are those before and after the call.
     void step_through()
     {
-        const pid_t child = fork();
-        if (child == 0) play();
-        int status = 0;
-        ASSERT_EQ(waitpid(child, &status, 0), child);
-        if (WIFEXITED(status) && WEXITSTATUS(status) == 77) GTEST_SKIP() << "no process may be traced here";
-        ASSERT_TRUE(WIFSTOPPED(status) && WSTOPSIG(status) == SIGSTOP) << status;
-        const tail_reader file(file_);
-        images_.emplace_back(file.bytes());
-        while (ptrace(PTRACE_SINGLESTEP, child, nullptr, nullptr) == 0 && waitpid(child, &status, 0) == child &&
-               WIFSTOPPED(status)) {
-            if (file.bytes() != images_.back()) images_.emplace_back(file.bytes());
-        }
-        ASSERT_EQ(status, 0);
+        std::optional<tail_reader> file;
+        const stepped seen = single_step([this] { prepare(); }, GetParam().call,
+                                         [&] { images_.emplace_back(file.emplace(file_).bytes()); },
+                                         [&] {
+                                             if (file->bytes() != images_.back()) images_.emplace_back(file->bytes());
+                                         });
+        if (!seen.possible) GTEST_SKIP() << "no process may be traced here";
+        ASSERT_EQ(seen.ended_by, 0);
         ASSERT_GT(images_.size(), 5U) << "the call was not seen";
+        count("A writer stopped at every instruction", "rounds", 1);
+        count("A writer stopped at every instruction", "faults", seen.instructions);
     }
 
     // A record that is to be found: its place, and everything in it.

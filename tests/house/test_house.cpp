@@ -121,6 +121,23 @@ TEST(House, EveryFileIsOpenedInOnePlaceSoThatAnExecutedProgramDoesNotGetIt)
     EXPECT_GE(openings, 4U);
 }
 
+// What a file or a caller holds is checked and told, and never the end of the program.
+TEST(House, NothingIsAsserted)
+{
+    const std::regex asserting(R"(\bassert *\(|<cassert>|<assert\.h>)");
+    for (const fs::path &file : code_below({"trace", "platform", "tools", "include"}))
+        for (const std::string &line : lines_of(file)) EXPECT_FALSE(std::regex_search(line, asserting)) << file << line;
+}
+
+// A name that somebody chose is never a format: the compiler looks at every call.
+TEST(House, FormatsAreCheckedByTheCompiler)
+{
+    std::string flags;
+    for (const std::string &line : lines_of(source / "cmake/flags.cmake")) flags += line + "\n";
+    for (const char *flag : {"-Wformat=2", "-Werror=format-security", "-fstack-protector-strong", "_FORTIFY_SOURCE=3"})
+        EXPECT_NE(flags.find(flag), std::string::npos) << flag;
+}
+
 TEST(House, NothingIsMarkedAsUnfinished)
 {
     const std::regex marker("\\b(TO"

@@ -337,7 +337,9 @@ TEST(HostileProgramName, IsPlayed)
 TEST(HostileProgramName, IsCutIntoTheHeader)
 {
     const scratch folder(memory_folder());
-    for (const std::string &name : hostile_values()) {
+    uint64_t executions = 0;
+    for (size_t i = 0; i < hostile_values().size(); i += rounds(5, 1), ++executions) {
+        const std::string &name = hostile_values()[i];
         const std::string trace = folder / "app.trc";
         const pid_t child = fork();
         if (child == 0) {
@@ -357,14 +359,14 @@ TEST(HostileProgramName, IsCutIntoTheHeader)
         }
         std::filesystem::remove(trace);
     }
-    count(item, "executions", hostile_values().size());
+    count(item, "executions", executions);
 }
 
 // The judge itself: a process that dies, a code that nobody knows, a process that does not trace any more.
 TEST(PlantedHarm, OfHostileValuesIsFound)
 {
     const auto judged = [](const call_with &call) { return story_of(call, {0}, "x", memory_folder()); };
-    EXPECT_TRUE(WIFSIGNALED(judged([](const auto &, const auto &) { return raise(SIGSEGV); })));
+    EXPECT_TRUE(WIFSIGNALED(judged([](const auto &, const auto &) { return raise(SIGKILL); })));
     EXPECT_EQ(WEXITSTATUS(judged([](const auto &, const auto &) { return 5; })), undocumented_code);
     EXPECT_EQ(WEXITSTATUS(judged([](const auto &, const auto &) {
                   tr_term();

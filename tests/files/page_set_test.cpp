@@ -51,6 +51,22 @@ TEST_F(PageSet, SharesARecursiveMutex)
     EXPECT_TRUE(is_free(*head->pSpoolMutex));
 }
 
+// From the moment that the set's lock is the one that writers take.
+TEST_F(PageSet, IsLockedWhileItIsMade)
+{
+    int mapped = 0;
+    calls().mmap = [&](size_t size, int protection, int flags, int fd, off_t offset) {
+        EXPECT_EQ(qn::tr::anchor_set_mutex(head), head->pSpoolMutex);
+        EXPECT_FALSE(is_free(*head->pSpoolMutex));
+        ++mapped;
+        return __real_mmap(nullptr, size, protection, flags, fd, offset);
+    };
+    EXPECT_EQ(start_set("t", 2), 0);
+    calls() = {};
+    EXPECT_EQ(mapped, 2);
+    EXPECT_TRUE(is_free(*head->pSpoolMutex));
+}
+
 TEST_F(PageSet, IsFoundByTheNameOfTheTrace)
 {
     ASSERT_EQ(start_set("t", 3), 0);

@@ -2,7 +2,8 @@
 //
 // Order, from first to last; a thread takes a lock only while it holds none that comes later:
 //   1 global mutex            anchors.anchorMutex: components, specifications, starting and stopping of traces
-//   2 anchor set lock         one per trace file or page set: the mapping and the ring
+//   2 anchor set lock         one per trace file or page set: the mapping and the ring; who makes a page set of a single
+//                             file holds the file's and takes the set's
 //   3 a page's anchorMutex    one page of a set, while it is reset or copied
 //   4 spool queue mutex       the queue of full pages, and unmapping
 //   leaves, under which no other lock is taken:
@@ -19,6 +20,7 @@
 
 #include <atomic>
 #include <cerrno>
+#include <optional>
 #include <pthread.h>
 #include <sys/single_threaded.h>
 
@@ -221,6 +223,24 @@ public:
 private:
     guard_mark mark_;
     taken_mutex taken_;
+};
+
+// Holds the lock of the page set that a single file may become. Binding the file to a specification makes that one its set
+// lock at once: who does so holds it too until the file is ready for whoever comes by the new lock.
+class future_set_lock
+{
+public:
+    explicit future_set_lock(const trace_anchor_t *anchor)
+    {
+        if (anchor->pSpoolMutex != nullptr) take(*anchor->pSpoolMutex);
+    }
+    void take(pthread_mutex_t &mutex)
+    {
+        if (!lock_) lock_.emplace(mutex, lock_rank::set);
+    }
+
+private:
+    std::optional<mutex_lock> lock_;
 };
 
 // Makes every lock free again in a forked child, where the threads that held them do not exist.

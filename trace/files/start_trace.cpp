@@ -76,8 +76,8 @@ trace_anchor_t *new_pages(trace_anchor_t *head, const char *base_name, qn_uint32
     return first;
 }
 
-// Makes the anchor the head of a ring of `pages` page anchors.
-qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
+// Makes the anchor the head of a ring of `pages` page anchors; the set's lock is held behind it.
+qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages, future_set_lock &lock)
 {
     trace_spool_spec_t *spool = head->spool;
     const qn_uint32_t wanted = load_relaxed(spool->pg_size);
@@ -95,6 +95,7 @@ qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages)
     // A set taken apart leaves its mutex behind, in case a thread still waits for it.
     pthread_mutex_t *shared = head->pSpoolMutex != nullptr ? head->pSpoolMutex : new_recursive_mutex();
     if (shared == nullptr) return set_error(QN_TR_ENOMEM, 14);
+    lock.take(*shared);
     name_page(head->fileName, base_name, 1);
     debug("creating page '%s'\n", head->fileName);
     store_release(head->pSpoolMutex, shared);
@@ -152,11 +153,12 @@ qn_int32_t start_trace(trace_anchor_t *anchor)
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
     if (load_relaxed(this_is_child) != 0) return 0; // the parent may be writing the file
 
+    future_set_lock lock(anchor);
     if (may_become_page_set(anchor)) {
         bind_to_specification(anchor);
         const qn_uint32_t pages = spooling_is_on(anchor) ? load_relaxed(anchor->spool->pages) : 0;
         if (pages != 0) {
-            const qn_int32_t status = make_page_set(anchor, pages);
+            const qn_int32_t status = make_page_set(anchor, pages, lock);
             if (status != 0) return status;
         }
     }

@@ -48,6 +48,7 @@ trace_spool_spec_t *bind_anew(trace_anchor_t *anchor)
 {
     const anchor_set_lock set(anchor);
     if (!set) return anchor->spool;
+    const future_set_lock lock(anchor);
     anchor->bSpoolProcessed = 0;
     return process_spool_spec(anchor, anchors.pFirstSpoolSpec);
 }

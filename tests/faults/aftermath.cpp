@@ -44,20 +44,6 @@ bool gets_free(pthread_mutex_t &mutex)
     return false;
 }
 
-const char *held_lock()
-{
-    if (!is_free(anchor_list_mutex)) return "anchor list";
-    if (!is_free(component_list_mutex)) return "component list";
-    if (!is_free(configuration_file_last_modified_mutex)) return "configuration time";
-    if (!is_free(cluster_info_mutex)) return "cluster info";
-    if (!gets_free(spq.mutex)) return "spool queue";
-    for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = anchor->next) {
-        if (!gets_free(anchor->anchorMutex)) return anchor == &anchors ? "global" : "trace file";
-        if (anchor->pSpoolMutex != nullptr && !gets_free(*anchor->pSpoolMutex)) return "page set";
-    }
-    return "";
-}
-
 uint64_t open_descriptors()
 {
     uint64_t count = 0;
@@ -85,6 +71,20 @@ void tell_error(aftermath &told)
 
 namespace qn::test
 {
+const char *held_lock()
+{
+    if (!is_free(anchor_list_mutex)) return "anchor list";
+    if (!is_free(component_list_mutex)) return "component list";
+    if (!is_free(configuration_file_last_modified_mutex)) return "configuration time";
+    if (!is_free(cluster_info_mutex)) return "cluster info";
+    if (!gets_free(spq.mutex)) return "spool queue";
+    for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = anchor->next) {
+        if (!gets_free(anchor->anchorMutex)) return anchor == &anchors ? "global" : "trace file";
+        if (anchor->pSpoolMutex != nullptr && !gets_free(*anchor->pSpoolMutex)) return "page set";
+    }
+    return "";
+}
+
 std::string aftermath::how_it_ended() const
 {
     static constexpr const char *stages[] = {"while it prepared", "in the attacked call", "in the call made again",

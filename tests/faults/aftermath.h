@@ -76,6 +76,9 @@ private:
     aftermath *told_;
 };
 
+// The name of a lock of the library that somebody holds, or nothing.
+const char *held_lock();
+
 // Fails the test where the call did harm, `undisturbed` being the aftermath of the same call without an attack.
 void expect_no_harm(const attacked_call &call, const aftermath &told, const aftermath &undisturbed);
 } // namespace qn::test

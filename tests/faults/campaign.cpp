@@ -15,6 +15,11 @@ uint32_t rounds(uint32_t fast, uint32_t whole)
     return campaign != nullptr && std::string_view(campaign) == "whole" ? whole : fast;
 }
 
+uint32_t rounds_of_every_build(uint32_t fast, uint32_t whole)
+{
+    return std::getenv("QN_CAMPAIGN") != nullptr ? whole : fast;
+}
+
 void count(std::string_view item, std::string_view what, uint64_t number)
 {
     const char *results = std::getenv("QN_CAMPAIGN_RESULTS");

@@ -170,8 +170,8 @@ TEST_F(Mutexes, AreFreeAfterTheirHolderWasCancelled)
     cancelled_thread thread;
     EXPECT_TRUE(thread.run([&] {
         const qn::tr::global_lock global;
-        const qn::tr::mutex_lock list(anchor_list_mutex);
         const qn::tr::mutex_lock queue(spq.mutex);
+        const qn::tr::mutex_lock list(anchor_list_mutex);
         thread.block();
     }));
     EXPECT_TRUE(is_free(anchors.anchorMutex));

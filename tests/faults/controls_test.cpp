@@ -1,12 +1,15 @@
 // Harm that was planted, so that it is known that the campaign's instruments find harm.
+#include <cerrno>
 #include <csignal>
 #include <cstdlib>
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
 #include <map>
+#include <sys/mman.h>
 #include <sys/wait.h>
 #include <unistd.h>
+#include <utility>
 
 #include <gtest/gtest-spi.h>
 #include <gtest/gtest.h>
@@ -34,12 +37,12 @@ class Planted : public testing::Test
 {
 protected:
     // The harm is found, and what is said about it has that text.
-    void expect_found(const std::function<qn_int32_t()> &harm, const std::string &text)
+    void expect_found(const std::function<qn_int32_t(const std::string &)> &harm, const std::string &text)
     {
         static aftermath told;
         static aftermath undisturbed;
         static attacked_call call;
-        call = {"Planted", nothing, [=](const std::string &) { return harm(); }, nothing, {14}, false};
+        call = {"Planted", nothing, harm, nothing, {14}, false};
         told = play_planted(call);
         call.call = [](const std::string &) { return 0; };
         undisturbed = play_planted(call);
@@ -52,7 +55,7 @@ protected:
 TEST_F(Planted, LossOfMemoryIsFound)
 {
     expect_found(
-        [] {
+        [](const std::string &) {
             void *volatile lost = std::malloc(1);
             return lost != nullptr ? 0 : 14;
         },
@@ -61,18 +64,31 @@ TEST_F(Planted, LossOfMemoryIsFound)
 
 TEST_F(Planted, OpenDescriptorIsFound)
 {
-    expect_found([] { return open("/dev/null", O_RDONLY | O_CLOEXEC) < 0; }, "descriptors are left open");
+    expect_found([](const std::string &) { return open("/dev/null", O_RDONLY | O_CLOEXEC) < 0; },
+                 "descriptors are left open");
+}
+
+TEST_F(Planted, MappedFileIsFound)
+{
+    expect_found(
+        [](const std::string &folder) {
+            const int fd = open((folder + "/file").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
+            void *map = mmap(nullptr, 1, PROT_READ, MAP_SHARED, fd, 0);
+            close(fd);
+            return map != MAP_FAILED ? 0 : 14;
+        },
+        "files are left mapped");
 }
 
 TEST_F(Planted, HeldLockIsFound)
 {
-    expect_found([] { return lockGlobalMutex(); }, "is held behind the call");
+    expect_found([](const std::string &) { return lockGlobalMutex(); }, "is held behind the call");
 }
 
 TEST_F(Planted, UnknownCodeIsFound)
 {
     expect_found(
-        [] {
+        [](const std::string &) {
             static int calls = 0;
             return calls++ == 0 ? 15 : 0;
         },
@@ -82,7 +98,7 @@ TEST_F(Planted, UnknownCodeIsFound)
 TEST_F(Planted, CallThatDoesNotWorkAgainIsFound)
 {
     expect_found(
-        [] {
+        [](const std::string &) {
             static int calls = 0;
             return calls++ == 0 ? 0 : 14;
         },
@@ -97,6 +113,99 @@ TEST(PlantedEnd, OfTheProgramIsFound)
     EXPECT_EQ(told.stage, aftermath::prepared);
     EXPECT_TRUE(WIFSIGNALED(told.ended_by));
     count("Planted harm is found", "rounds", 1);
+}
+
+TEST(PlantedUse, OfMemoryThatRanOutIsFound)
+{
+    const attacked_call careless = {"Planted",
+                                    nothing,
+                                    [](const std::string &) {
+                                        volatile char *block = static_cast<char *>(std::malloc(1));
+                                        block[0] = 'x';
+                                        std::free(const_cast<char *>(block));
+                                        return 0;
+                                    },
+                                    nothing,
+                                    {}};
+    const aftermath told = play_in_child(
+        careless, {[] { fail_allocations(1, running_out::once); }, stop_failing_allocations, live_allocations});
+    EXPECT_EQ(told.stage, aftermath::prepared);
+    EXPECT_TRUE(WIFSIGNALED(told.ended_by)) << told.how_it_ended();
+    count("Planted harm is found", "rounds", 1);
+}
+
+// A call that opens a file, writes eight bytes and closes it, and does not look at the results.
+class CarelessCall : public testing::Test
+{
+protected:
+    ~CarelessCall() override { count("Planted harm is found", "rounds", 1); }
+
+    static std::string file_in(const std::string &folder) { return folder + "/file"; }
+
+    static qn_int32_t make(const std::string &folder)
+    {
+        const int fd = open(file_in(folder).c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+        const ssize_t written = write(fd, "12345678", 8);
+        close(fd);
+        return written < 0 ? 15 : 0;
+    }
+
+    static std::string half_made(const std::string &folder)
+    {
+        std::error_code no_file;
+        const uintmax_t bytes = std::filesystem::file_size(file_in(folder), no_file);
+        return bytes == 8 ? "" : "of " + std::to_string(bytes) + " bytes";
+    }
+
+    // The aftermath with that intervention at the system call with that number, the first being openat().
+    static aftermath played(const intervention &with)
+    {
+        watched process;
+        const aftermath told = play_watched(call, with, process);
+        EXPECT_TRUE(process.intervened || with.what == intervention::nothing);
+        return told;
+    }
+
+    static inline const attacked_call call{"Planted", nothing, make, nothing, {14}, false, false, 0, false, half_made};
+};
+
+TEST_F(CarelessCall, IsFoundWhereASystemCallFails)
+{
+    static const aftermath undisturbed = played({});
+    static const aftermath told = played({intervention::fails, 1, EMFILE});
+    EXPECT_NONFATAL_FAILURE(expect_no_harm(call, told, undisturbed), "returned 15");
+}
+
+TEST_F(CarelessCall, IsFoundWhereAWriteIsCutShort)
+{
+    // Made once more, the call would mend what it left.
+    static const attacked_call once = [] {
+        attacked_call made_once = call;
+        made_once.call = [made = false](const std::string &folder) mutable {
+            return std::exchange(made, true) ? 0 : make(folder);
+        };
+        return made_once;
+    }();
+    watched process;
+    static const aftermath undisturbed = play_watched(once, {}, process);
+    static const aftermath told = play_watched(once, {intervention::is_cut_short, 2, 0}, process);
+    EXPECT_NONFATAL_FAILURE(expect_no_harm(once, told, undisturbed), "is not whole");
+}
+
+TEST_F(CarelessCall, IsKilledAtTheSystemCallThatWasAskedFor)
+{
+    for (const auto kind : {intervention::kills_before, intervention::kills_behind}) {
+        const scratch folder(memory_folder());
+        const watched process = watch(
+            [&] {
+                begin_watching();
+                make(folder.folder());
+                end_watching();
+            },
+            {kind, 2, 0});
+        EXPECT_TRUE(WIFSIGNALED(process.ended_by) && WTERMSIG(process.ended_by) == SIGKILL);
+        EXPECT_EQ(std::filesystem::file_size(file_in(folder.folder())), kind == intervention::kills_before ? 0U : 8U);
+    }
 }
 
 // How often each system call occurs between the marks in what strace wrote: lines like "123 [ 257] openat(...".

@@ -66,6 +66,26 @@ protected:
     one_trace trace{roomy_file};
 };
 
+volatile uint32_t pair[2] = {0, 0};
+volatile uint32_t torn = 0;
+
+void look_at_pair(int)
+{
+    if (pair[0] != pair[1]) torn = torn + 1;
+}
+
+// The one instruction between two stores is enough to be seen behind.
+TEST(PlantedTear, OfAPairOfWordsIsSeen)
+{
+    std::signal(SIGTRAP, look_at_pair);
+    interrupt_everywhere([] {
+        pair[0] = 1;
+        pair[1] = 1;
+    });
+    EXPECT_GT(torn, 0U);
+    count("Planted harm is found", "rounds", 1);
+}
+
 TEST_F(TracingSignalHandler, TearsAndLosesNoRecordOfAnyWriter)
 {
     constexpr record_author author = {1, 0};

@@ -1,8 +1,9 @@
 // Opening and closing files in a program whose descriptors are its own business. No state, no lock.
 //
-// The numbers 1 and 2 are written to by threads that do not look what is behind them. In a program that has closed them,
-// the next file that is opened gets such a number, and then has what was printed in it. So the closed ones are taken for
-// as long as a file is being opened, by descriptors that can neither be read nor written: who prints gets EBADF, as before.
+// The numbers 1 and 2 are written to by threads that do not look what is behind them. In a program that has closed
+// them, the next file that is opened gets such a number, and then has what was printed in it. So the closed ones are
+// taken for as long as a file is being opened, by descriptors that can neither be read nor written: who prints gets
+// EBADF, as before.
 #pragma once
 
 #include <cerrno>
@@ -97,7 +98,8 @@ inline int open_file(const char *path, int flags, mode_t mode = 0, int first = s
     return moved;
 }
 
-// fopen() of a text to be read. "c": reading is no cancellation point, so that a cancelled thread leaves no stream behind.
+// fopen() of a text to be read. "c": reading is no cancellation point, so that a cancelled thread leaves no stream
+// behind.
 inline FILE *open_text(const char *path)
 {
     const standard_numbers_taken other_numbers;

@@ -1,6 +1,6 @@
-// Values that nobody means well with, in every environment variable, every name and every key of the configuration: each
-// in a process of its own with bounds on time and memory, which lives, is told a documented code, and traces afterwards.
-// All debug lines are asked for, so that every name goes through them.
+// Values that nobody means well with, in every environment variable, every name and every key of the configuration:
+// each in a process of its own with bounds on time and memory, which lives, is told a documented code, and traces
+// afterwards. All debug lines are asked for, so that every name goes through them.
 #include <algorithm>
 #include <cstdlib>
 #include <cstring>
@@ -70,8 +70,8 @@ bool is_recorded(const std::string &folder, const std::string &trace, const std:
     return false;
 }
 
-// The same process traces with values that make sense. Other traces of it, which have no file yet, may go on having none:
-// the calls tell so.
+// The same process traces with values that make sense. Other traces of it, which have no file yet, may go on having
+// none: the calls tell so.
 bool traces_afterwards(const std::string &folder)
 {
     static client component("SANE");

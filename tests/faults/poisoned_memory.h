@@ -1,5 +1,6 @@
-// Memory that tells where it comes from: a program linked with this file has malloc() and its kin of its own, which fill
-// every block with a pattern when it is given and when it is taken back. Stack and vector registers get it on demand.
+// Memory that tells where it comes from: a program linked with this file has malloc() and its kin of its own, which
+// fill every block with a pattern when it is given and when it is taken back. Stack and vector registers get it on
+// demand.
 #pragma once
 
 #include <cstdint>

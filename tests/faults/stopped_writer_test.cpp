@@ -1,5 +1,6 @@
-// Every writer, stopped behind each of its instructions: what stands in the files at that moment is read as qntrace reads
-// it, and another process goes on with it. Nothing but the record in flight is affected, and what it is to overwrite.
+// Every writer, stopped behind each of its instructions: what stands in the files at that moment is read as qntrace
+// reads it, and another process goes on with it. Nothing but the record in flight is affected, and what it is to
+// overwrite.
 #include <algorithm>
 #include <cstdlib>
 #include <cstring>
@@ -104,8 +105,8 @@ public:
         return seen.possible && !moments_.empty();
     }
 
-    // What the call does not overwrite is there at every moment, whole, and besides that nothing but what is there in the
-    // end; the reader finds the same, and no damage.
+    // What the call does not overwrite is there at every moment, whole, and besides that nothing but what is there in
+    // the end; the reader finds the same, and no damage.
     void expect_nothing_else_affected() const
     {
         const found_records before = data_in(moments_.front());

@@ -103,8 +103,8 @@ TEST(House, NoFileOfTheLibraryOutgrowsItsRoom)
         EXPECT_LE(lines_of(file).size(), most_lines) << file;
 }
 
-// By a function that never gives a file the number of a standard stream; only a thread that has a table of descriptors of
-// its own may do without.
+// By a function that never gives a file the number of a standard stream; only a thread that has a table of
+// descriptors of its own may do without.
 TEST(House, EveryFileIsOpenedInOnePlaceSoThatAnExecutedProgramDoesNotGetIt)
 {
     const std::regex opening(R"(\b(?:open|openat|openat2|creat|fopen|freopen|mkstemp|mkostemp|pipe|dup|socket)\()");

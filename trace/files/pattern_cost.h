@@ -1,9 +1,9 @@
 // What it costs to compile a regular expression, found out before regcomp() does.
 //
-// regcomp() of the C library repeats a repeated part in memory, doubles it for a "+", keeps for every part that may be
-// empty a list of all behind it, tries an anchor inside a repetition in all its combinations, and walks into parentheses
-// on the stack. A few dozen characters suffice to take all memory, all time or the stack of the program, with the
-// library's global lock held. docs/patterns.md has what was measured.
+// regcomp() of the C library repeats a repeated part in memory, doubles it for a "+", keeps for every part that may
+// be empty a list of all behind it, tries an anchor inside a repetition in all its combinations, and walks into
+// parentheses on the stack. A few dozen characters suffice to take all memory, all time or the stack of the program,
+// with the library's global lock held. docs/patterns.md has what was measured.
 #pragma once
 
 #include <string_view>

@@ -3,8 +3,9 @@
 // It holds the queue mutex all the time, except while it waits and while it works under the locks that come before that
 // one: the global mutex and set locks, for the configuration and for syncing.
 //
-// It has descriptors of its own. A program that makes itself a daemon closes all of them, at a time of its own choosing,
-// and opens its files under the same numbers: with shared ones, the rest of a copy would be written into such a file.
+// It has descriptors of its own. A program that makes itself a daemon closes all of them, at a time of its own
+// choosing, and opens its files under the same numbers: with shared ones, the rest of a copy would be written into
+// such a file.
 #include <csignal>
 #include <cstdlib>
 #include <ctime>
@@ -61,8 +62,8 @@ private:
 };
 
 // What tells cp_thread that it is the spool thread's body, and that the thread may have descriptors of its own. The
-// connection to the system log has a number that the C library remembers for all threads: who asked for lines there, for
-// servicing the library, has one table for all of them. A sanitizer follows descriptors by their numbers.
+// connection to the system log has a number that the C library remembers for all threads: who asked for lines there,
+// for servicing the library, has one table for all of them. A sanitizer follows descriptors by their numbers.
 constexpr bool is_sanitized =
 #if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
     true;

@@ -89,6 +89,9 @@ public:
         copy(offsetof(trace_file_header_t, uActualFileSize), sizeof(trace_file_header_t::uActualFileSize));
         copy(offsetof(trace_file_header_t, program), sizeof(trace_file_header_t::program));
         file[0] = static_cast<char>(file[0] | header_[0]);
+        // The record that a reader holds is the reader's word, which a start leaves alone. An odd one is none.
+        constexpr size_t seq_lock = offsetof(trace_file_header_t, uSeqLock);
+        if (file[seq_lock] % 2 != 0) copy(seq_lock, sizeof(trace_file_header_t::uSeqLock));
     }
 
     static void start(trace_anchor_t *anchor)

@@ -96,7 +96,7 @@ TEST_F(QueuedState, ReadyIsDroppedWithoutACopy)
     EXPECT_TRUE(entries_of(copies).empty());
 }
 
-TEST_F(QueuedState, OtherIsLookedAtAgainWithoutWaiting)
+TEST_F(QueuedState, OtherIsLookedAtAgainWithoutWaitingForASignal)
 {
     queue_page(2, active);
     queue_page(3, full);

@@ -100,6 +100,7 @@ std::vector<storm_call> component_calls()
              tr_mini_component_anchor_t *components = nullptr;
              const int status = tr_get_current_trace_levels_1(&count, &components);
              tr_release_comp_info_1(count, components);
+             if (count == 0) std::free(components); // which the release leaves alone
              return status;
          },
          {}},

@@ -229,16 +229,13 @@ cu_error_t *sample_error()
     static char ffdc_id[] = "ffdc-id";
     static char catalogue[] = "app.cat";
     static char text[] = "Failed.";
-    static cu_error_t sample = [] {
-        cu_error_t error{};
-        error.cu_error_id = 18;
-        error.cu_ffdc_id = ffdc_id;
-        error.cu_msg_cat = catalogue;
-        error.cu_msg_set = 5;
-        error.cu_msg_num = 6;
-        error.cu_msg_default = text;
-        return error;
-    }();
+    static thread_local cu_error_t sample{};
+    sample.cu_error_id = 18;
+    sample.cu_ffdc_id = ffdc_id;
+    sample.cu_msg_cat = catalogue;
+    sample.cu_msg_set = 5;
+    sample.cu_msg_num = 6;
+    sample.cu_msg_default = text;
     return &sample;
 }
 } // namespace qn::test

@@ -3,9 +3,11 @@
 
     summary.py DOCUMENT BUILD...
 
-Each BUILD folder holds campaign.jsonl, the figures that the tests counted, and campaign.xml, how they ended. In
-DOCUMENT the table stands between two marker lines.
+Each BUILD folder holds campaign.jsonl, the figures that the tests counted, and campaign.xml, how they ended. What was
+found and mended is in findings.txt beside this program; the first BUILD shows how much. In DOCUMENT the table stands
+between two marker lines.
 """
+import collections
 import json
 import os
 import sys
@@ -13,7 +15,7 @@ import xml.etree.ElementTree
 
 BEGIN = "<!-- campaign: begin -->"
 END = "<!-- campaign: end -->"
-HEADINGS = ["Attack", "Build", "Rounds", "Faults injected", "Executions", "Failed tests"]
+HEADINGS = ["Attack", "Build", "Rounds", "Faults injected", "Executions", "Findings mended", "Failed tests"]
 FIGURES = ["rounds", "faults", "executions"]
 
 
@@ -30,6 +32,13 @@ def read_figures(folder):
     return sums, item_of
 
 
+def read_findings():
+    """How many findings each attack has."""
+    name = os.path.join(os.path.dirname(os.path.abspath(__file__)), "findings.txt")
+    with open(name, encoding="utf-8") as lines:
+        return collections.Counter(line.split(": ")[0] for line in lines if not line.startswith("#"))
+
+
 def failed_tests(folder):
     name = os.path.join(folder, "campaign.xml")
     if not os.path.exists(name):
@@ -38,7 +47,7 @@ def failed_tests(folder):
     return [case.get("name") for case in cases if case.get("status") == "fail"]
 
 
-def rows_of(folder):
+def rows_of(folder, findings):
     build = os.path.basename(os.path.normpath(folder))
     sums, item_of = read_figures(folder)
     failed = dict.fromkeys(sums, 0)
@@ -48,7 +57,11 @@ def rows_of(folder):
         failed[item] = failed.get(item, 0) + 1
     for item in sorted(failed):
         figures = sums.get(item, dict.fromkeys(FIGURES, 0))
-        yield [item, build] + [f"{figures[what]:,}".replace(",", " ") for what in FIGURES] + [str(failed[item])]
+        yield ([item, build] + [f"{figures[what]:,}".replace(",", " ") for what in FIGURES] +
+               [str(findings[item]) if findings else "", str(failed[item])])
+    unknown = findings.keys() - failed.keys()
+    if unknown:
+        sys.exit("findings of attacks that did not take place: " + ", ".join(sorted(unknown)))
 
 
 def as_table(rows):
@@ -75,7 +88,10 @@ def put_into(document, table):
 
 def main():
     document, *folders = sys.argv[1:]
-    table = as_table([HEADINGS] + [row for folder in folders for row in rows_of(folder)])
+    rows = list(rows_of(folders[0], read_findings()))
+    for folder in folders[1:]:
+        rows += rows_of(folder, {})
+    table = as_table([HEADINGS] + rows)
     print(table)
     put_into(document, table)
 

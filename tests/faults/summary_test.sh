@@ -7,6 +7,7 @@ work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
 mkdir -p "$work/tests/faults" "$work/docs" "$work/bin" "$work"/build/{release,asan,tsan}
 cp "$1/run.sh" "$1/summary.py" "$work/tests/faults"
+printf '# Comment\nAn attack: one finding\nAn attack: another one\n' >"$work/tests/faults/findings.txt"
 printf 'before\n<!-- campaign: begin -->\nold\n<!-- campaign: end -->\nbehind\n' >"$work/docs/reliability.md"
 
 # Counts a figure for one test, and reports it and another one, which counted nothing, as PLANTED says.
@@ -32,11 +33,11 @@ if PATH=$work/bin:$PATH PLANTED=fail "$work/tests/faults/run.sh" >/dev/null; the
     echo 'the campaign does not fail with its tests'
     exit 1
 fi
-expect '| An attack  | release |      0 |           1 234 |          0 |            1 |'
-expect '| Died.Early | release |      0 |               0 |          0 |            1 |'
-expect '| An attack  | tsan    |      0 |           1 234 |          0 |            1 |'
+expect '| An attack  | release |      0 |           1 234 |          0 |               2 |            1 |'
+expect '| Died.Early | release |      0 |               0 |          0 |               0 |            1 |'
+expect '| An attack  | tsan    |      0 |           1 234 |          0 |                 |            1 |'
 expect before
 expect behind
 
 PATH=$work/bin:$PATH PLANTED=run "$work/tests/faults/run.sh" >/dev/null
-expect '| An attack | release |      0 |           1 234 |          0 |            0 |'
+expect '| An attack | release |      0 |           1 234 |          0 |               2 |            0 |'

@@ -103,6 +103,16 @@ TEST_F(HostileWord, OfAHoldCostsTwoSecondsForEachRecordThatIsOverwrittenAndNoMor
     EXPECT_EQ(sleeps().size(), 4U * 400);
 }
 
+TEST_F(HostileWord, OfNoHoldMakesNobodyWaitForARecordOfThatNumber)
+{
+    const one_trace trace(small_file);
+    lay_out({{32, 1, 1}, {32, 1, 1}, {32, 1, 1}, {32, 1, 1}, {3768, 1, 38}}, 0);
+    tail_reader reader(trace.file());
+    reader.set_u32(tail_reader::seq_lock, qn::tr::format::seq_lock_none);
+    EXPECT_TRUE(allocate(100).given);
+    EXPECT_EQ(sleeps().size(), 0U);
+}
+
 TEST_F(HostileWord, OfARequestCostsHalfASecondForEachRecord)
 {
     const one_trace trace(small_file);

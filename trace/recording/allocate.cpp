@@ -40,6 +40,12 @@ bool is_multipage(const trace_anchor_t *anchor)
     return page->pNextFree != page->pWrap ? pageFull(page, requested) : nullptr;
 }
 
+// The number that stands for no record holds none, not even one that has it: in a damaged ring there may be one.
+bool is_held(const trace_file_header_t *header, const trace_record_header_t *record)
+{
+    return record->seqNumber == load_relaxed(header->uSeqLock) && record->seqNumber != format::seq_lock_none;
+}
+
 qn_uint32_t bytes_to_end(const trace_anchor_t *anchor, const trace_record_header_t *record)
 {
     return static_cast<qn_uint32_t>(anchor->pMapEnd - reinterpret_cast<const unsigned char *>(record));
@@ -177,7 +183,7 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
     bool wrapped = false;
     for (qn_int64_t budget = pAnchor->uRequestedFileSize;; budget -= record_header_bytes) {
         if (__builtin_expect(budget < 0, 0)) return give_up_looping(pAnchor, requested);
-        if (__builtin_expect(next->seqNumber == load_relaxed(header->uSeqLock), 0)) wait_tail(pAnchor, next->seqNumber);
+        if (__builtin_expect(is_held(header, next), 0)) wait_tail(pAnchor, next->seqNumber);
         if (__builtin_expect(next->function == start_kind, 0)) start = next;
         const unsigned char *behind_next = address(next) + next->length;
         if (__builtin_expect(behind_next > end, 0)) {

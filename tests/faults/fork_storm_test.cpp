@@ -43,7 +43,9 @@ pid_t wait_for(pid_t child, int &status)
 bool ends_well(pid_t child)
 {
     int status = 0;
-    return child > 0 && wait_for(child, status) == child && status == 0;
+    const bool ended = child > 0 && wait_for(child, status) == child;
+    if (!ended || status != 0) std::fprintf(stderr, "child %d ended with the status 0x%x\n", child, status);
+    return ended && status == 0;
 }
 
 // From here on a store into a trace file that was mapped at the fork is the end of the child.
@@ -106,7 +108,9 @@ protected:
         tr_release_comp_info_1(count, levels);
         for (uint32_t number = 0; number < 70; ++number)
             status |= write_numbered(child_author, number, tokens[number % 3]);
-        if (status != 0) _exit(11);
+        if (status == 0) return;
+        std::fprintf(stderr, "the library's calls gave 0x%x\n", status);
+        _exit(11);
     }
 
     pid_t child_that(const std::function<void()> &body) const

@@ -1,7 +1,11 @@
 // Forked children: tracing is over in them, and the parent's files are the parent's.
 #include <atomic>
+#include <csignal>
+#include <functional>
 #include <thread>
 
+#include <sys/mman.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -198,5 +202,74 @@ TEST_F(BusyProcess, HasNoRecordOfAChildInItsFiles)
     threads.clear();
     for (const std::string &name : {file, folder / "other"})
         for (const record_image &record : trace_image::of_file(name).records()) ASSERT_NE(record.component(), "KIDS");
+}
+
+// The bytes of two levels, each in a memory page of its own that cannot be written to: who stores into one comes by here.
+class watched_levels
+{
+public:
+    explicit watched_levels(std::function<void()> body)
+    {
+        visit = std::move(body);
+        void *map = mmap(nullptr, 2 * page_bytes, PROT_READ, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+        pages = map != MAP_FAILED ? static_cast<char *>(map) : nullptr;
+        struct sigaction action {
+        };
+        action.sa_sigaction = &stored_into;
+        action.sa_flags = SA_SIGINFO;
+        sigaction(SIGSEGV, &action, &before_);
+    }
+    watched_levels(const watched_levels &) = delete;
+    watched_levels &operator=(const watched_levels &) = delete;
+    ~watched_levels()
+    {
+        let_all_in();
+        sigaction(SIGSEGV, &before_, nullptr);
+    }
+
+    static void let_all_in() { mprotect(pages, 2 * page_bytes, PROT_READ | PROT_WRITE); }
+    static tr_detail_level_t *levels() { return reinterpret_cast<tr_detail_level_t *>(pages + page_bytes - 1); }
+
+private:
+    static constexpr size_t page_bytes = 4096;
+
+    static void stored_into(int, siginfo_t *info, void *)
+    {
+        const bool first = static_cast<char *>(info->si_addr) == pages + page_bytes - 1;
+        if (!first && static_cast<char *>(info->si_addr) != pages + page_bytes) _exit(1);
+        mprotect(pages, 2 * page_bytes, PROT_READ);
+        mprotect(first ? pages : pages + page_bytes, page_bytes, PROT_READ | PROT_WRITE);
+        visit();
+    }
+
+    static inline char *pages = nullptr;
+    static inline std::function<void()> visit;
+    struct sigaction before_ {
+    };
+};
+
+TEST_F(ForkedChild, FindsEveryComponentWholeThoughOneIsBeingRegistered)
+{
+    int forked = 0;
+    {
+        const watched_levels levels([&forked] {
+            const pid_t child = fork();
+            if (child == 0) {
+                watched_levels::let_all_in();
+                int count = 0;
+                tr_mini_component_anchor_t *components = nullptr;
+                const int status = tr_set_trace_levels_1("*:*=1") | tr_get_current_trace_levels_1(&count, &components);
+                _exit(status == 0 && count == 1 ? 0 : 1);
+            }
+            int status = -1;
+            waitpid(child, &status, 0);
+            EXPECT_EQ(status, 0) << "child " << forked;
+            ++forked;
+        });
+        const tr_category_description_t categories[] = {{0, "First", 1, 1}, {1, "Second", 1, 1}};
+        EXPECT_EQ(tr_register_component_1("HALF", watched_levels::levels(), categories, 2), 0);
+    }
+    EXPECT_EQ(forked, 4) << "two levels are set to 0, and to what they begin with";
+    EXPECT_EQ(tr_unregister_component_1("HALF"), 0);
 }
 } // namespace

@@ -61,31 +61,32 @@ component_anchor_t *new_component(const tr_category_description_t *categories, q
     return nullptr;
 }
 
-// Puts the component at the head of the list. From here on others find it by its identifier.
-void link_component(component_anchor_t *component, const char *id, tr_detail_level_t *levels, qn_uint32_t count)
+// All that a component says of itself, and the levels that it begins with.
+void describe_component(component_anchor_t *component, const char *id, tr_detail_level_t *levels,
+                        const tr_category_description_t *categories, qn_uint32_t count)
 {
-    for (qn_uint32_t i = 0; i < count; ++i) store_relaxed(levels[i], 0);
+    std::memcpy(component->compId, id, strnlen(id, 4));
     component->pDetailLevels = levels;
     component->numberOfCategories = static_cast<int>(count);
-    std::memcpy(component->compId, id, strnlen(id, 4));
-
-    const mutex_lock list(component_list_mutex);
-    component->pNext = anchors.pFirstComp;
-    anchors.pFirstComp = component;
-}
-
-void copy_categories(component_anchor_t *component, const tr_category_description_t *categories)
-{
-    char *name = reinterpret_cast<char *>(component->categories + component->numberOfCategories);
-    for (int i = 0; i < component->numberOfCategories; ++i) {
+    for (qn_uint32_t i = 0; i < count; ++i) store_relaxed(levels[i], 0);
+    char *name = reinterpret_cast<char *>(component->categories + count);
+    for (qn_uint32_t i = 0; i < count; ++i) {
         const size_t bytes = std::strlen(categories[i].category_name) + 1;
         std::memcpy(name, categories[i].category_name, bytes);
         component->categories[i] = categories[i];
         component->categories[i].category_name = name;
         name += bytes;
-        store_relaxed(component->pDetailLevels[i],
-                      static_cast<tr_detail_level_t>(categories[i].minimum_level_of_detail));
+        store_relaxed(levels[i], static_cast<tr_detail_level_t>(categories[i].minimum_level_of_detail));
     }
+}
+
+// Puts the component at the head of the list, when there is nothing of it left to write: others find it by its identifier
+// from here on, and a child that another thread forks just now has the list as it is.
+void link_component(component_anchor_t *component)
+{
+    const mutex_lock list(component_list_mutex);
+    component->pNext = anchors.pFirstComp;
+    anchors.pFirstComp = component;
 }
 
 void apply_specifications(component_anchor_t *component)
@@ -145,8 +146,8 @@ qn_int32_t tr_ms_register_component_1(const qn_char_t *pComponentId, tr_detail_l
         if (component == nullptr) return set_error(QN_TR_ENOMEM, 14);
         in_progress.building(component);
         if (fileTokens != nullptr) *fileTokens = component->pFileTokens;
-        link_component(component, pComponentId, pLevelArray, numberOfCategories);
-        copy_categories(component, pCategoryDesc);
+        describe_component(component, pComponentId, pLevelArray, pCategoryDesc, numberOfCategories);
+        link_component(component);
         apply_specifications(component);
         status = start_traces_that_are_on();
         in_progress.done();

@@ -126,6 +126,7 @@ protected:
 
 TEST_F(TwoProcesses, ThatRecordIntoOneFileSpoilNothingElse) { record_at_the_same_time(running); }
 
+#ifndef __SANITIZE_THREAD__ // one process says in the file that a page may be copied while the other still writes it
 TEST_F(TwoProcesses, ThatRecordIntoOnePageSetSpoilNothingElse)
 {
     record_at_the_same_time([](const std::string &where) {
@@ -133,6 +134,7 @@ TEST_F(TwoProcesses, ThatRecordIntoOnePageSetSpoilNothingElse)
         EXPECT_EQ(name_it(where), 0);
     });
 }
+#endif
 
 // What a reader finds of both is reported: it ends by itself, whatever there is.
 TEST_F(TwoProcesses, LeaveAFileThatIsReadToItsEnd)

@@ -180,6 +180,7 @@ void work_until_stopped()
 
 void mk_sp_thread(void)
 {
+    const qn::platform::no_cancel whole; // it would be done once more, and make a second thread
     pthread_t thread = 0;
     const signals_blocked until_it_blocks_them_itself;
     if (pthread_create(&thread, nullptr, cp_thread, argument_for_thread()) != 0) {

@@ -113,6 +113,16 @@ TEST_F(HostileWord, OfNoHoldMakesNobodyWaitForARecordOfThatNumber)
     EXPECT_EQ(sleeps().size(), 0U);
 }
 
+TEST_F(HostileWord, InALengthLeadsNoWriterToTheLastBytesOfTheFile)
+{
+    const one_trace trace(small_file);
+    lay_out({{3760, 1, 30}, {136, 1, 32}}, 1);
+    poke_u32(3960, 128); // 8 bytes stay behind the last record
+    standard_error_of([] { EXPECT_FALSE(allocate(100).given); });
+    for (qn_uint32_t id = 1; id <= 300; ++id) ASSERT_EQ(tr_record_id_1("TEST", id), 0);
+    EXPECT_FALSE(trace.written().empty());
+}
+
 TEST_F(HostileWord, OfARequestCostsHalfASecondForEachRecord)
 {
     const one_trace trace(small_file);

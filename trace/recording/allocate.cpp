@@ -205,6 +205,9 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
             return give_up(pAnchor, "opal_trace: allocate_space overrun one\n");
         }
     }
+    const unsigned char *consumed_end = address(pAnchor->pNextFree) + consumed;
+    if (__builtin_expect(consumed == needed && consumed_end > end - record_header_bytes && consumed_end != end, 0))
+        return give_up(pAnchor, "opal_trace: allocate_space overrun one\n"); // the next record would have no header
     start_of_process overwritten;
     if (__builtin_expect(start != nullptr, 0)) remember(overwritten, header, start, bytes_to_end(pAnchor, start));
 

@@ -292,12 +292,12 @@ def instructions(build, _rounds):
 
 
 def counted_instructions(system, kind):
-    few, many = 1000, 3000
+    few, many = 10_000, 110_000
 
     def count(records):
         with Scratch() as folder:
             log = folder / "callgrind.log"
-            system.run(folder, "--kind", kind, "--records", records, "--warm-up", 1000, "--ring", 65536, wrapper=(
+            system.run(folder, "--kind", kind, "--records", records, "--warm-up", 5000, "--ring", 65536, wrapper=(
                 "valgrind", "--tool=callgrind", "--callgrind-out-file=/dev/null", f"--log-file={log}"))
             collected = [line for line in log.read_text().splitlines() if "Collected" in line]
             return int(collected[-1].split(":")[1])

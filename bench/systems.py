@@ -35,7 +35,9 @@ class System:
     def there(self):
         return self.command[0].exists()
 
-    def start(self):
+    environment = None  # of the producer: this program's
+
+    def start(self, subbuffer=None):
         """What has to be there before the producer, daemons for instance."""
 
     def stop(self):
@@ -48,7 +50,7 @@ class System:
         """Runs the producer; its result, with the CPU time of the whole process in "process_seconds"."""
         command = [*map(str, wrapper), *map(str, self.command), str(folder), *self.options, *map(str, options)]
         with tempfile.TemporaryFile() as output:
-            process = subprocess.Popen(command, stdout=output, stderr=subprocess.DEVNULL)
+            process = subprocess.Popen(command, env=self.environment, stdout=output, stderr=subprocess.DEVNULL)
             _, status, used = os.wait4(process.pid, 0)
             process.returncode = status
             if status not in (0, signal.SIGKILL):
@@ -98,7 +100,7 @@ class Lttng(System):
     def there(self):
         return super().there() and shutil.which("lttng-sessiond") is not None
 
-    def start(self, subbuffer="256K"):
+    def start(self, subbuffer=None):
         self.home = tempfile.mkdtemp(prefix="qn_tr_bench.lttng.")
         self.environment = os.environ | {"LTTNG_HOME": self.home}
         self.session_daemon = subprocess.Popen(["lttng-sessiond", "--no-kernel"], env=self.environment,
@@ -109,7 +111,8 @@ class Lttng(System):
                 raise RuntimeError("lttng-sessiond does not answer")
             time.sleep(0.1)
         self.lttng("create", "bench", "--snapshot", "--output", self.home + "/snapshot")
-        self.lttng("enable-channel", "-u", "ring", "--overwrite", "--subbuf-size", subbuffer, "--num-subbuf", "4")
+        self.lttng("enable-channel", "-u", "ring", "--overwrite", "--subbuf-size", subbuffer or "256K",
+                   "--num-subbuf", "4")
         for event in self.events:
             self.lttng("enable-event", "-u", "-c", "ring", event)
         self.lttng("start")
@@ -117,10 +120,6 @@ class Lttng(System):
     def lttng(self, *arguments, check=True):
         return subprocess.run(["lttng", *arguments], env=self.environment, check=check,
                               stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL).returncode
-
-    def run(self, folder, *options, wrapper=()):
-        os.environ["LTTNG_HOME"] = self.home
-        return super().run(folder, *options, wrapper=wrapper)
 
     def stop(self):
         self.lttng("destroy", "bench", check=False)

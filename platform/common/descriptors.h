@@ -11,6 +11,7 @@
 #include <ctime>
 #include <fcntl.h>
 #include <iterator>
+#include <nl_types.h>
 #include <poll.h>
 #include <pthread.h>
 #include <unistd.h>
@@ -104,6 +105,13 @@ inline FILE *open_text(const char *path)
 {
     const standard_numbers_taken other_numbers;
     return std::fopen(path, "rce");
+}
+
+// catopen() of a message catalogue, in the language of the locale.
+inline nl_catd open_messages(const char *name)
+{
+    const standard_numbers_taken other_numbers;
+    return catopen(name, NL_CAT_LOCALE);
 }
 
 // localtime_r(), which reads the file of the time zone.

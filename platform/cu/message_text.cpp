@@ -21,11 +21,7 @@ namespace
 class catalogue
 {
 public:
-    explicit catalogue(const char *name)
-    {
-        const platform::standard_numbers_taken other_numbers;
-        opened_ = catopen(name, NL_CAT_LOCALE);
-    }
+    explicit catalogue(const char *name) : opened_(platform::open_messages(name)) {}
     catalogue(const catalogue &) = delete;
     catalogue &operator=(const catalogue &) = delete;
     ~catalogue()

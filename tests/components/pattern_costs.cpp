@@ -16,26 +16,18 @@
 
 #include <qn_tr.h>
 
+#include "support/pattern_text.h"
+
 namespace
 {
+using qn::test::nested;
+using qn::test::repeated;
+
 struct experiment {
     std::string title;
     std::string pattern; // for the category
     std::string name;    // of the category
 };
-
-std::string repeated(const std::string &text, int times)
-{
-    std::string all;
-    for (int i = 0; i < times; ++i) all += text;
-    return all;
-}
-
-// "(((a+)+)+)": each "+" holds its operand twice.
-std::string nested(const std::string &operand, const std::string &repetition, int depth)
-{
-    return repeated("(", depth) + operand + repeated(repetition + ")", depth) + repetition;
-}
 
 std::vector<experiment> experiments()
 {

@@ -14,6 +14,7 @@
 
 #include <gtest/gtest.h>
 
+#include "faults/program.h"
 #include "support/last_error.h"
 #include "support/scratch.h"
 #include "trace/trace.h"
@@ -21,8 +22,6 @@
 namespace
 {
 using namespace qn::test;
-
-constexpr unsigned longest_seconds = 60; // a process that takes longer hangs
 
 bool is_free(pthread_mutex_t &mutex)
 {
@@ -96,7 +95,7 @@ std::string aftermath::how_it_ended() const
 
 void play(const attacked_call &call, const attack &attack, const std::string &folder, aftermath &told)
 {
-    alarm(longest_seconds);
+    alarm(most_seconds);
     const uint64_t allocations_of_test = attack.allocations();
     call.prepare(folder);
     leave_marker();

@@ -33,20 +33,7 @@ using namespace qn::test;
 
 constexpr const char *reused = "Descriptors closed and used again";
 constexpr const char *no_standard = "No standard descriptors";
-constexpr unsigned longest_seconds = 60;
 constexpr int first_number = 3;
-
-// Runs the body in a process of its own; true when it ended by itself, in time, and had returned true.
-bool in_process(const std::function<bool()> &body)
-{
-    const pid_t child = fork();
-    if (child == 0) {
-        alarm(longest_seconds);
-        _exit(body() ? 0 : 1);
-    }
-    int status = 0;
-    return waitpid(child, &status, 0) == child && status == 0;
-}
 
 void close_standard_descriptors()
 {
@@ -105,7 +92,7 @@ openings openings_without_standard_descriptors(const std::function<void()> &prep
 {
     process = watch(
         [&] {
-            alarm(longest_seconds);
+            alarm(most_seconds);
             // A thread with a table of descriptors of its own has standard numbers of its own.
             setenv("QN_TR_DEBUG_LEVEL", "0", 1);
             setenv("TZ", ":/etc/passwd", 1); // a file that is there, for the C library to look for a time zone in

@@ -53,7 +53,6 @@ using namespace qn::test;
 
 constexpr uint32_t small_file = 4096;
 constexpr uint32_t ring_begins = 200;
-constexpr unsigned longest_seconds = 60;
 
 // Header words, by their offsets.
 constexpr size_t version = 2;
@@ -64,7 +63,7 @@ constexpr size_t page_state = 192;
 class HostileWord : public testing::Test
 {
 protected:
-    HostileWord() { alarm(longest_seconds); }
+    HostileWord() { alarm(most_seconds); }
     ~HostileWord() override
     {
         on_getpid = nullptr;

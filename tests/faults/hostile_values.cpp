@@ -1,18 +1,11 @@
 #include "faults/hostile_values.h"
 
+#include "support/pattern_text.h"
+
 namespace
 {
-std::string repeated(const std::string &text, int times)
-{
-    std::string all;
-    for (int i = 0; i < times; ++i) all += text;
-    return all;
-}
-
-std::string nested(const std::string &operand, const std::string &repetition, int depth)
-{
-    return repeated("(", depth) + operand + repeated(repetition + ")", depth) + repetition;
-}
+using qn::test::nested;
+using qn::test::repeated;
 
 std::vector<std::string> formats_and_bytes()
 {

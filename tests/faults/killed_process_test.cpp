@@ -22,7 +22,6 @@ using namespace qn::test;
 constexpr qn_uint32_t recorded = 100;      // ids 1 to this one, before the attack
 constexpr qn_uint32_t first_later = 10001; // ids of the process that goes on
 constexpr qn_uint32_t later = 5;
-constexpr unsigned longest_seconds = 60;
 
 using ids = std::set<qn_uint32_t>;
 
@@ -52,18 +51,6 @@ bool has_all(const ids &found, qn_uint32_t first, qn_uint32_t count)
     return true;
 }
 
-// Runs the body in a process of its own; true when it ended by itself, in time, and had returned true.
-bool in_process(const std::function<bool()> &body)
-{
-    const pid_t child = fork();
-    if (child == 0) {
-        alarm(longest_seconds);
-        _exit(body() ? 0 : 1);
-    }
-    int status = 0;
-    return waitpid(child, &status, 0) == child && status == 0;
-}
-
 class KilledAtSystemCalls : public testing::Test
 {
 protected:
@@ -81,7 +68,7 @@ protected:
             SCOPED_TRACE("system call " + std::to_string(number) + (turn % 2 == 0 ? ", before it" : ", behind it"));
             const watched process = watch(
                 [&] {
-                    alarm(longest_seconds);
+                    alarm(most_seconds);
                     prepare(folder.folder());
                     begin_watching();
                     act(folder.folder());

@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <filesystem>
 
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include "support/scratch.h"
@@ -81,5 +82,16 @@ void wait_for_queue()
         const qn::tr::mutex_lock queue(spq.mutex);
         if (spq.cnt == 0) return;
     }
+}
+
+bool in_process(const std::function<bool()> &body)
+{
+    const pid_t child = fork();
+    if (child == 0) {
+        alarm(most_seconds);
+        _exit(body() ? 0 : 1);
+    }
+    int status = 0;
+    return waitpid(child, &status, 0) == child && status == 0;
 }
 } // namespace qn::test

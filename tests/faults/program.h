@@ -1,6 +1,7 @@
 // The program that is attacked: one component, small files below one folder, and what it does with them.
 #pragma once
 
+#include <functional>
 #include <string>
 
 #include "support/last_error.h"
@@ -45,4 +46,9 @@ qn_int32_t write_ids(qn_uint32_t first, qn_uint32_t count);
 
 // Until everything is copied.
 void wait_for_queue();
+
+inline constexpr unsigned most_seconds = 60; // a process that takes longer hangs
+
+// Runs the body in a process of its own; true when it ended by itself, in time, and had returned true.
+bool in_process(const std::function<bool()> &body);
 } // namespace qn::test

@@ -34,7 +34,6 @@ using namespace qn::test;
 
 constexpr const char *item = "A writer stopped at every instruction";
 constexpr uint32_t file_bytes_wanted = 4096;
-constexpr unsigned longest_seconds = 60;
 constexpr uint32_t bytes_of_restart = 52 + 32 + 2 * 28; // its two records, each with a rest behind it
 
 // The files of a trace at one moment.
@@ -86,7 +85,7 @@ public:
         };
         const stepped seen = single_step(
             [this] {
-                alarm(longest_seconds);
+                alarm(most_seconds);
                 writer_.prepare(folder_.folder());
             },
             writer_.call,
@@ -126,7 +125,7 @@ public:
     {
         const pid_t child = fork();
         if (child == 0) {
-            alarm(longest_seconds);
+            alarm(most_seconds);
             for (const moment &now : moments_) expect_continued(now);
             _exit(testing::Test::HasFailure() ? 1 : 0);
         }

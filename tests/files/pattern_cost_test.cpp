@@ -8,24 +8,15 @@
 
 #include <gtest/gtest.h>
 
+#include "support/pattern_text.h"
 #include "trace/files/compiled_pattern.h"
 
 namespace
 {
+using qn::test::nested;
+using qn::test::repeated;
 using qn::tr::compiled_pattern;
 using qn::tr::is_affordable;
-
-std::string repeated(const std::string &text, int times)
-{
-    std::string all;
-    for (int i = 0; i < times; ++i) all += text;
-    return all;
-}
-
-std::string nested(const std::string &operand, const std::string &repetition, int depth)
-{
-    return repeated("(", depth) + operand + repeated(repetition + ")", depth) + repetition;
-}
 
 double seconds_of_processor()
 {

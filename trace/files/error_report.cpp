@@ -39,11 +39,7 @@ int record_error(int error_code, int msg_code, int number, const char *string)
 class open_catalogue
 {
 public:
-    explicit open_catalogue(const char *name)
-    {
-        const qn::platform::standard_numbers_taken other_numbers;
-        catd_ = catopen(name, NL_CAT_LOCALE);
-    }
+    explicit open_catalogue(const char *name) : catd_(qn::platform::open_messages(name)) {}
     open_catalogue(const open_catalogue &) = delete;
     open_catalogue &operator=(const open_catalogue &) = delete;
     ~open_catalogue()

@@ -78,6 +78,16 @@ template <class Writer>
     return 0;
 }
 
+// Writes a record by a writer of that class, made of what the call was given. Inlined: it may stand behind the one test
+// that leaves the forwarding through exported names out.
+template <class Writer, class... Given>
+[[gnu::always_inline]] inline qn_int32_t write_record_by(const qn_char_t *comp_id, tr_file_token_t token,
+                                                         Given... given)
+{
+    Writer writer(given...);
+    return write_record(comp_id, token, writer);
+}
+
 // Where a record's variable part begins.
 template <class Record>
 inline unsigned char *body_of(Record *record)

@@ -80,19 +80,12 @@ own_ms_data_v(const qn_char_t *, qn_uint32_t, tr_file_token_t, qn_uint32_t, va_l
 namespace
 {
 const bool data_are_own = tr_record_data_v_1 == own_data_v && tr_ms_record_data_v_1 == own_ms_data_v;
-
-[[gnu::always_inline]] inline qn_int32_t write_data(const qn_char_t *comp_id, qn_uint32_t trace_id,
-                                                    tr_file_token_t token, qn_uint32_t number, va_list args)
-{
-    data_writer writer(trace_id, number, args);
-    return write_record(comp_id, token, writer);
-}
 } // namespace
 
 qn_int32_t tr_ms_record_data_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
                                  qn_uint32_t blkCount, va_list args)
 {
-    return write_data(pCompId, traceId, fileToken, blkCount, args);
+    return write_record_by<data_writer>(pCompId, fileToken, traceId, blkCount, args);
 }
 
 qn_int32_t tr_record_data_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint32_t blkCount, va_list args)
@@ -114,8 +107,9 @@ qn_int32_t tr_record_data_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_ui
 {
     va_list args;
     va_start(args, blkCount);
-    const qn_int32_t status = __builtin_expect(data_are_own, 1) ? write_data(pCompId, traceId, nullptr, blkCount, args)
-                                                                : tr_record_data_v_1(pCompId, traceId, blkCount, args);
+    const qn_int32_t status = __builtin_expect(data_are_own, 1)
+                                  ? write_record_by<data_writer>(pCompId, nullptr, traceId, blkCount, args)
+                                  : tr_record_data_v_1(pCompId, traceId, blkCount, args);
     va_end(args);
     return status;
 }

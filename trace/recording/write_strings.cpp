@@ -129,19 +129,12 @@ namespace
 {
 // Known when the library is loaded: all its names are bound then.
 const bool strings_are_own = tr_record_strings_v_1 == own_strings_v && tr_ms_record_strings_v_1 == own_ms_strings_v;
-
-[[gnu::always_inline]] inline qn_int32_t write_strings(const qn_char_t *comp_id, qn_uint32_t trace_id,
-                                                       tr_file_token_t token, qn_uint32_t number, va_list args)
-{
-    strings_writer writer(trace_id, number, args);
-    return write_record(comp_id, token, writer);
-}
 } // namespace
 
 qn_int32_t tr_ms_record_strings_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
                                     qn_uint32_t numStrings, va_list args)
 {
-    return write_strings(pCompId, traceId, fileToken, numStrings, args);
+    return write_record_by<strings_writer>(pCompId, fileToken, traceId, numStrings, args);
 }
 
 qn_int32_t tr_record_strings_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_uint32_t numStrings, va_list args)
@@ -164,7 +157,7 @@ qn_int32_t tr_record_strings_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn
     va_list args;
     va_start(args, numStrings);
     const qn_int32_t status = __builtin_expect(strings_are_own, 1)
-                                  ? write_strings(pCompId, traceId, nullptr, numStrings, args)
+                                  ? write_record_by<strings_writer>(pCompId, nullptr, traceId, numStrings, args)
                                   : tr_record_strings_v_1(pCompId, traceId, numStrings, args);
     va_end(args);
     return status;
@@ -178,8 +171,7 @@ qn_int32_t tr_record_string_1(const qn_char_t *pCompId, const qn_char_t *pString
 qn_int32_t tr_ms_record_vfmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
                                       const qn_char_t *pFormat, va_list args)
 {
-    formatted_writer writer(traceId, pFormat, args);
-    return write_record(pCompId, fileToken, writer);
+    return write_record_by<formatted_writer>(pCompId, fileToken, traceId, pFormat, args);
 }
 
 qn_int32_t tr_record_vfmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat,

@@ -86,6 +86,55 @@ TEST(FileMap, IsAppliedWholeAtEachCall)
     EXPECT_EQ(ab.tokens[0], anchor_of(files / "x.trc"));
 }
 
+TEST(FileMap, LetsALaterMapWinAtEachCall)
+{
+    const scratch files;
+    client ab("AB", 2, 0);
+    ASSERT_EQ(ab.register_now(), 0);
+    ASSERT_EQ(tr_set_file_map_1((files / "x.trc").c_str(), "AB:c0"), 0);
+    ASSERT_EQ(tr_set_file_map_1((files / "y.trc").c_str(), "AB:*"), 0);
+    ASSERT_EQ(tr_set_file_map_1((files / "z.trc").c_str(), "AB:c1"), 0);
+    ab.tokens[0] = ab.tokens[1] = nullptr;
+    ASSERT_EQ(tr_set_file_map_1((files / "z.trc").c_str(), "OTHER:*"), 0);
+    EXPECT_EQ(ab.tokens[0], anchor_of(files / "y.trc"));
+    EXPECT_EQ(ab.tokens[1], anchor_of(files / "z.trc"));
+}
+
+// The parser compiles both patterns to check them, then the application compiles both.
+constexpr int last_compilation = 4;
+
+TEST(FileMap, MeetsAgainAtTheNextCallWhatItCouldNotBeCompiledFor)
+{
+    const scratch files;
+    client ab("AB", 1, 0);
+    ASSERT_EQ(ab.register_now(), 0);
+    for (const int number : {last_compilation - 1, last_compilation}) {
+        const std::string file = files / std::to_string(number);
+        {
+            const failing_pattern failing(number);
+            ASSERT_EQ(tr_set_file_map_1(file.c_str(), "AB:*"), 0);
+        }
+        EXPECT_EQ(anchor_of(file), nullptr);
+        ASSERT_EQ(tr_set_file_map_1((files / "other.trc").c_str(), "OTHER:*"), 0);
+        ASSERT_NE(anchor_of(file), nullptr);
+        EXPECT_EQ(ab.tokens[0], anchor_of(file));
+    }
+}
+
+TEST(FileMap, CompilesOnlyThePatternsOfTheCall)
+{
+    const scratch files;
+    client ab("AB", 1, 0);
+    ASSERT_EQ(ab.register_now(), 0);
+    ASSERT_EQ(tr_set_file_map_1((files / "x.trc").c_str(), "AB:*"), 0);
+    const auto map_with_cancellation_in = [&](int number) {
+        const cancellation_in_pattern cancellation(number);
+        tr_set_file_map_1((files / "y.trc").c_str(), "AB:*");
+    };
+    EXPECT_FALSE(is_cancelled_in([&] { map_with_cancellation_in(last_compilation + 1); }));
+    EXPECT_TRUE(is_cancelled_in([&] { map_with_cancellation_in(last_compilation); }));
+}
+
 TEST(FileMap, ComesFromTheEnvironment)
 {
     const scratch files;
@@ -220,7 +269,7 @@ TEST(FileMap, DoesNothingWithAPatternThatDoesNotCompile)
     ASSERT_EQ(ab.register_now(), 0);
     char good[] = ".*";
     char bad[] = "(";
-    trace_map_spec_t spec{nullptr, nullptr, bad, good, nullptr, "/tmp/never.trc"};
+    trace_map_spec_t spec{nullptr, nullptr, bad, good, nullptr, "/tmp/never.trc", false};
     EXPECT_EQ(process_map_spec(&anchors, &spec, nullptr), 0);
     spec.pCompId = good;
     spec.pCategory = bad;

@@ -22,6 +22,7 @@ void free_component(component_anchor_t *component)
 {
     if (component == nullptr) return;
     std::free(component->pFileTokens);
+    std::free(component->pMappedBy);
     std::free(component);
 }
 

@@ -15,6 +15,7 @@ struct component_anchor {
     char rsvd[3];
     tr_detail_level_t *pDetailLevels; // the client's array, indexed by category_id; read without a lock
     tr_file_token_t *pFileTokens;     // one per entry of categories; null: the default file
+    trace_map_spec_t **pMappedBy;     // one per entry too: the last element of the file map that matched it, or null
     int numberOfCategories;
     tr_category_description_t categories[1]; // numberOfCategories of them, in the client's order
 };

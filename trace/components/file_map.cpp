@@ -103,11 +103,40 @@ int parse_map_spec(const char *pString, trace_map_spec_t **pFirstMapSpec, trace_
 int process_map_spec(trace_anchor_t *pAnchor, trace_map_spec_t *pMapSpec, component_anchor_t *pTgtComp)
 {
     // By position, where levels go by category_id.
-    for_each_match(pAnchor, pMapSpec, pTgtComp, [=](component_anchor_t *component, int entry) {
+    const bool compiled = for_each_match(pAnchor, pMapSpec, pTgtComp, [=](component_anchor_t *component, int entry) {
+        component->pMappedBy[entry] = pMapSpec;
         store_relaxed(component->pFileTokens[entry], findOrCreateAnchorForFile(pMapSpec->fileName, 1));
     });
+    pMapSpec->matched = compiled && (pMapSpec->matched || pTgtComp == nullptr);
     return 0;
 }
+
+namespace
+{
+// What applying the elements that were matched before comes to: each category has the file of the last of them that
+// matched it. Matching all of them again at every call would make a map that is given in many calls a matter of minutes.
+void apply_matched_elements()
+{
+    for (trace_map_spec_t *spec = anchors.pFirstMapSpec; spec != nullptr; spec = spec->pNext) spec->anchor_p = nullptr;
+    for (component_anchor_t *component = anchors.pFirstComp; component != nullptr; component = component->pNext) {
+        for (int i = 0; i < component->numberOfCategories; ++i) {
+            trace_map_spec_t *spec = component->pMappedBy[i];
+            if (spec == nullptr) continue;
+            if (spec->anchor_p == nullptr) spec->anchor_p = findOrCreateAnchorForFile(spec->fileName, 1);
+            store_relaxed(component->pFileTokens[i], spec->anchor_p);
+        }
+    }
+}
+
+// All elements, in their order.
+void apply_file_map()
+{
+    apply_matched_elements();
+    trace_map_spec_t *spec = anchors.pFirstMapSpec;
+    while (spec != nullptr && spec->matched) spec = spec->pNext;
+    for (; spec != nullptr; spec = spec->pNext) process_map_spec(&anchors, spec, nullptr);
+}
+} // namespace
 
 qn_int32_t tr_set_file_map_1(const char *fileName, const char *selectString)
 {
@@ -123,8 +152,7 @@ qn_int32_t tr_set_file_map_1(const char *fileName, const char *selectString)
         status = tr_set_file_map_chain(fileName, selectString != nullptr ? selectString : "", &anchors.pFirstMapSpec,
                                        &anchors.pLastMapSpec);
         if (status != 0) return status;
-        for (trace_map_spec_t *spec = anchors.pFirstMapSpec; spec != nullptr; spec = spec->pNext)
-            process_map_spec(&anchors, spec, nullptr);
+        apply_file_map();
         status = start_traces_that_are_on();
     }
     return status != 0 ? status : cu_set_no_error_1();

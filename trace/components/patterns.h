@@ -109,21 +109,22 @@ int append_pair(Node *&first, Node *&last, const pattern_pair &pair)
 }
 
 // Calls apply(component, i) for every category i that a node's patterns match, of all components on the anchor's list or
-// of `target` alone. Patterns that do not compile match nothing. Compiling is most of the work: the pattern for categories
-// is compiled when a component matches, which of many specifications most do not.
+// of `target` alone. Patterns that do not compile match nothing: the result is false. Compiling is most of the work: the
+// pattern for categories is compiled when a component matches, which of many specifications most do not.
 template <class Node, class Apply>
-void for_each_match(const trace_anchor_t *anchor, const Node *node, component_anchor_t *target, Apply apply)
+bool for_each_match(const trace_anchor_t *anchor, const Node *node, component_anchor_t *target, Apply apply)
 {
     const compiled_pattern component_pattern(node->pCompId);
-    if (!component_pattern) return;
+    if (!component_pattern) return false;
     std::optional<compiled_pattern> category_pattern;
     for (component_anchor_t *component = anchor->pFirstComp; component != nullptr; component = component->pNext) {
         if (target != nullptr && component != target) continue;
         if (!component_pattern.matches(component->compId)) continue;
         if (!category_pattern) category_pattern.emplace(node->pCategory);
-        if (!*category_pattern) return;
+        if (!*category_pattern) return false;
         for (int i = 0; i < component->numberOfCategories; ++i)
             if (category_pattern->matches(component->categories[i].category_name)) apply(component, i);
     }
+    return true;
 }
 } // namespace qn::tr

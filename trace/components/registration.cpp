@@ -56,8 +56,9 @@ component_anchor_t *new_component(const tr_category_description_t *categories, q
     auto *component = static_cast<component_anchor_t *>(std::calloc(1, bytes));
     if (component == nullptr) return nullptr;
     component->pFileTokens = static_cast<tr_file_token_t *>(std::calloc(count, sizeof(tr_file_token_t)));
-    if (component->pFileTokens != nullptr) return component;
-    std::free(component);
+    component->pMappedBy = static_cast<trace_map_spec_t **>(std::calloc(count, sizeof(trace_map_spec_t *)));
+    if (component->pFileTokens != nullptr && component->pMappedBy != nullptr) return component;
+    free_component(component);
     return nullptr;
 }
 

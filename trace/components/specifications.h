@@ -23,6 +23,7 @@ struct trace_map_spec {
     char *pCategory;
     trace_anchor_t *anchor_p; // not set by the parser: the file is looked up each time the node is applied
     char fileName[trace_file_name_bytes];
+    bool matched; // with every component that there is; one that registers is matched with all elements
 };
 
 // Appends the elements of a level specification to a list; on an error the list is as before.

@@ -66,7 +66,7 @@ TEST_F(CancelledStart, WhileOpeningLeavesNothing)
 
 TEST_F(CancelledStart, WhileExtendingLeavesNothing)
 {
-    trace_anchor_t *anchor = anchor_for(folder / "f");
+    trace_anchor_t *anchor = anchor_for(folder / "f", 1048576);
     int writes = 0;
     calls().write = [&](int fd, const void *bytes, size_t count) {
         if (++writes == 3) thread.block();

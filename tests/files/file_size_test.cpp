@@ -106,13 +106,13 @@ std::string pattern(size_t bytes)
     return text;
 }
 
-TEST(Extension, WritesTheWholeFileInChunksOf512Bytes)
+TEST(Extension, WritesTheWholeFileManyChunksAtATime)
 {
     const scratch folder;
     watched_writes writes;
-    start_without_record(folder / "f", 65536);
-    EXPECT_EQ(writes.counts, std::vector<size_t>(128, 512));
-    EXPECT_EQ(writes.total, 65536U);
+    start_without_record(folder / "f", 135168);
+    EXPECT_EQ(writes.counts, (std::vector<size_t>{65536, 65536, 4096}));
+    EXPECT_EQ(writes.total, 135168U);
 }
 
 TEST(Extension, WritesThePatternOfAllByteValues)
@@ -120,7 +120,7 @@ TEST(Extension, WritesThePatternOfAllByteValues)
     const scratch folder;
     watched_writes writes;
     start_without_record(folder / "f", 8192);
-    for (const std::string &chunk : writes.chunks) EXPECT_EQ(chunk, pattern(512));
+    for (const std::string &chunk : writes.chunks) EXPECT_EQ(chunk, pattern(chunk.size()));
     const std::string bytes = file_bytes(folder / "f");
     EXPECT_EQ(bytes.substr(512, 512), pattern(512));
     EXPECT_EQ(bytes.substr(8192 - 512), pattern(512));
@@ -132,7 +132,7 @@ TEST(Extension, StartsThePatternWhereTheFileEnded)
     write_file(folder / "f", std::string(1000, '\x77'));
     watched_writes writes;
     start_without_record(folder / "f", 4096);
-    EXPECT_EQ(writes.counts, (std::vector<size_t>{512, 512, 512, 512, 512, 512, 24}));
+    EXPECT_EQ(writes.counts, (std::vector<size_t>{3096}));
     const std::string bytes = file_bytes(folder / "f");
     EXPECT_EQ(bytes.size(), 4096U);
     EXPECT_EQ(bytes.substr(228, 772), std::string(772, '\x77'));
@@ -140,18 +140,29 @@ TEST(Extension, StartsThePatternWhereTheFileEnded)
     EXPECT_EQ(bytes.substr(1000 + 6 * 512), pattern(24));
 }
 
-TEST(Extension, StartsThePatternAfreshAfterAShortWrite)
+TEST(Extension, CompletesTheChunkFromThePatternsFirstByteAfterAShortWrite)
 {
     const scratch folder;
     watched_writes writes;
     writes.shortened_to = {512, 100, 300};
     start_without_record(folder / "f", 4096);
-    EXPECT_EQ(writes.counts, (std::vector<size_t>{512, 512, 412, 112, 512, 512, 512, 512, 512, 512}));
+    EXPECT_EQ(writes.counts, (std::vector<size_t>{4096, 3584, 412, 112, 3072}));
     for (const std::string &chunk : writes.chunks) EXPECT_EQ(chunk, pattern(chunk.size()));
     const std::string bytes = file_bytes(folder / "f");
     EXPECT_EQ(bytes.size(), 4096U);
     EXPECT_EQ(bytes.substr(512, 512), pattern(100) + pattern(300) + pattern(112));
     EXPECT_EQ(bytes.substr(1024, 512), pattern(512));
+}
+
+TEST(Extension, CompletesTheLastChunkToo)
+{
+    const scratch folder;
+    write_file(folder / "f", std::string(1000, '\x77'));
+    watched_writes writes;
+    writes.shortened_to = {3082};
+    start_without_record(folder / "f", 4096);
+    EXPECT_EQ(writes.counts, (std::vector<size_t>{3096, 14}));
+    EXPECT_EQ(file_bytes(folder / "f").substr(1000 + 6 * 512), pattern(10) + pattern(14));
 }
 
 TEST(Extension, GoesOnAfterAnInterruption)

@@ -17,14 +17,18 @@ namespace
 {
 using qn::tr::smallest_file_bytes;
 
-constexpr std::array<unsigned char, 512> make_pattern()
+// What a file is made of before its ring is: chunks of 512 bytes that count up. Many of them go into one call.
+constexpr size_t chunk_bytes = 512;
+using chunks = std::array<unsigned char, 128 * chunk_bytes>;
+
+constexpr chunks make_pattern()
 {
-    std::array<unsigned char, 512> pattern{};
+    chunks pattern{};
     for (size_t i = 0; i < pattern.size(); ++i) pattern[i] = static_cast<unsigned char>(i);
     return pattern;
 }
 
-constexpr std::array<unsigned char, 512> pattern = make_pattern();
+constexpr chunks pattern = make_pattern();
 
 // What the file system lets the trace take of it: one percent is held back. Unsigned on purpose: where less than one
 // percent is free the bound vanishes, and the writes below find out.
@@ -55,22 +59,23 @@ qn_int32_t settle_for_less(int fd, qn_uint32_t page_size, int write_errno, qn_ui
 }
 
 // Writes pattern bytes from the end of the file until it has `size` bytes. Every write starts at the pattern's first
-// byte, also one that completes a short write.
+// byte, also the one that completes a chunk after a short write.
 qn_int32_t write_pattern(int fd, qn_uint64_t current_size, qn_uint32_t page_size, qn_uint32_t &size)
 {
     if (exceeds_file_size_limit(size)) return set_error_int(QN_TR_ECLEAR, 23, EFBIG);
     qn_uint64_t remaining = size - current_size;
+    size_t rest_of_chunk = 0;
     while (remaining > 0) {
-        size_t chunk = std::min<qn_uint64_t>(remaining, pattern.size());
-        remaining -= chunk;
-        while (chunk > 0) {
-            const ssize_t written = write(fd, pattern.data(), chunk);
-            if (written >= 0)
-                chunk -= static_cast<size_t>(written);
-            else if (errno == ENOSPC || errno == EDQUOT)
-                return settle_for_less(fd, page_size, errno, size);
-            else if (errno != EINTR)
-                return set_error_int(QN_TR_ECLEAR, 23, errno);
+        const size_t most = rest_of_chunk != 0 ? rest_of_chunk : pattern.size();
+        const ssize_t written = write(fd, pattern.data(), std::min<qn_uint64_t>(remaining, most));
+        if (written >= 0) {
+            const auto bytes = static_cast<size_t>(written);
+            remaining -= bytes;
+            rest_of_chunk = (rest_of_chunk + chunk_bytes - bytes % chunk_bytes) % chunk_bytes;
+        } else if (errno == ENOSPC || errno == EDQUOT) {
+            return settle_for_less(fd, page_size, errno, size);
+        } else if (errno != EINTR) {
+            return set_error_int(QN_TR_ECLEAR, 23, errno);
         }
     }
     return 0;

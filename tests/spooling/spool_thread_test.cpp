@@ -27,6 +27,7 @@ protected:
             sigset_t mask;
             pthread_sigmask(SIG_BLOCK, nullptr, &mask);
             for (int number = 1; number < 32; ++number) blocked[number] = sigismember(&mask, number) == 1;
+            scheduling = sched_getscheduler(0);
             ++waits;
         };
     }
@@ -56,6 +57,7 @@ protected:
     std::atomic<int> waits{0};
     std::atomic<time_t> deadline{0};
     std::atomic<bool> blocked[32] = {};
+    std::atomic<int> scheduling{-1};
 };
 
 TEST_F(SpoolThread, TellsThatItRuns)
@@ -87,6 +89,14 @@ TEST_F(SpoolThread, LeavesTheSignalsOfItsCreatorAsTheyWere)
     pthread_sigmask(SIG_BLOCK, nullptr, &after);
     for (int number = 1; number < 32; ++number)
         EXPECT_EQ(sigismember(&after, number), sigismember(&before, number)) << number;
+}
+
+TEST_F(SpoolThread, DoesNotTakeTheProcessorFromTheWriterWhoWakesIt)
+{
+    start_thread();
+    wait_for_waits(1);
+    EXPECT_EQ(scheduling, SCHED_BATCH);
+    EXPECT_EQ(sched_getscheduler(0), SCHED_OTHER);
 }
 
 TEST_F(SpoolThread, WaitsForAnHour)

@@ -11,6 +11,7 @@
 #include <ctime>
 #include <fcntl.h>
 #include <pthread.h>
+#include <sched.h>
 #include <sys/mman.h>
 #include <unistd.h>
 
@@ -84,6 +85,14 @@ void leave_descriptors_to_program()
     int number = 0;
     do number = open("/dev/null", O_RDWR | O_CLOEXEC);
     while (number != -1 && number < qn::platform::standard_error);
+}
+
+// The writer that fills a page wakes this thread, and goes on recording: it is not to be taken off its processor for the
+// time of a copy. Threads that work in batches wait for their turn.
+void let_writers_go_first()
+{
+    const sched_param ordinary{};
+    if (sched_getscheduler(0) == SCHED_OTHER) sched_setscheduler(0, SCHED_BATCH, &ordinary);
 }
 
 // The default trace's interval, whatever the other traces have.
@@ -194,6 +203,7 @@ void mk_sp_thread(void)
 void *cp_thread(void *argument)
 {
     if (argument == &own_descriptors) leave_descriptors_to_program();
+    let_writers_go_first();
     store_release(is_spool_running, 1);
     debug("Start cp_thread...\n");
     cu_block_thread_allsig_except_syncsig_1();

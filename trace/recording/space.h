@@ -25,17 +25,18 @@ inline trace_record_header_t *record_of(const unsigned char *address)
 {
     constexpr int most_records = 8;
     const qn_uint32_t held_by_reader = load_relaxed(header_of(anchor)->uSeqLock);
-    const unsigned char *last_place = anchor->pMapEnd - format::record_header_bytes;
+    const unsigned char *end = anchor->pMapEnd;
     const unsigned char *first = address(anchor->pNextFree);
-    if (__builtin_expect(first > last_place, 0)) return 0; // a page that was filled exactly
+    const unsigned char *enough = first + needed;
+    // Nearer to the end a place might have no room for a header.
+    if (__builtin_expect(enough > end - format::record_header_bytes, 0)) return 0;
     const unsigned char *at = first;
     for (int records = 0; records < most_records; ++records) {
         const trace_record_header_t *record = record_of(at);
-        const bool plain =
-            record->seqNumber != held_by_reader && record->function != static_cast<qn_uint16_t>(format::kind::start);
+        if (__builtin_expect(record->seqNumber == held_by_reader, 0)) return 0;
+        if (__builtin_expect(record->function == static_cast<qn_uint16_t>(format::kind::start), 0)) return 0;
         at += record->length;
-        if (__builtin_expect(!plain || at > last_place, 0)) return 0;
-        if (static_cast<qn_uint64_t>(at - first) >= needed) return static_cast<qn_uint32_t>(at - first);
+        if (at >= enough) return at <= end ? static_cast<qn_uint32_t>(at - first) : 0;
     }
     return 0;
 }

@@ -1,5 +1,5 @@
 // What it takes to start and stop a large trace, beside what the machine takes for the bytes: writing as many into a new
-// file, and reading the memory that holds them. One line of JSON for each step.
+// file and to the disk, and reading the memory that holds them. One line of JSON for each step.
 //
 //   start_stop FOLDER [BYTES]
 #include <chrono>
@@ -44,6 +44,7 @@ void write_file(const std::string &name, std::size_t bytes)
     for (std::size_t done = 0; done < bytes; done += block.size())
         want(pwrite(fd, block.data(), block.size(), static_cast<off_t>(done)) == static_cast<ssize_t>(block.size()),
              "pwrite");
+    want(fsync(fd) == 0, "fsync");
     close(fd);
 }
 

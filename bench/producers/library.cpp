@@ -31,7 +31,8 @@ public:
         app.add_option("--anchors", all.anchors, "other trace files");
         app.add_option("--components", all.components, "other components");
         app.add_option("--specifications", all.specifications, "level specifications that match nothing here");
-        app.add_option("--pages", all.pages, "pages of the trace file; they are copied while records are written");
+        app.add_option("--pages", all.pages,
+                       "pages of 256 KiB that the trace has; they are copied while records are written");
     }
 
     explicit library(const options &all)
@@ -86,7 +87,7 @@ private:
     static std::string spool_specification(const options &all, const std::string &trace)
     {
         if (all.pages == 0) return "none";
-        return trace + ":ON:" + std::to_string(all.pages) + ":" + all.folder + "/spool:" + std::to_string(all.ring);
+        return trace + ":ON:" + std::to_string(all.pages) + ":" + all.folder + "/spool";
     }
 
     static std::string other_component(unsigned number) { return std::to_string(1000 + number); }

@@ -79,6 +79,14 @@ void thread_result::add_long(std::uint64_t ticks)
     longest_ = std::max(longest_, ticks);
 }
 
+std::uint64_t thread_result::longest() const
+{
+    if (longest_ != 0) return longest_;
+    std::size_t ticks = single_ticks - 1;
+    while (ticks > 0 && counts_[ticks] == 0) --ticks;
+    return ticks;
+}
+
 void pause_for(double microseconds)
 {
     std::this_thread::sleep_for(std::chrono::duration<double, std::micro>(microseconds));

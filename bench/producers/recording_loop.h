@@ -66,14 +66,14 @@ public:
     std::uint64_t ticks = 0; // of the bursts
     const std::array<std::uint32_t, single_ticks> &counts() const { return counts_; }
     const std::array<std::uint64_t, 64> &powers() const { return powers_; }
-    std::uint64_t longest() const { return longest_; }
+    std::uint64_t longest() const;
 
 private:
     void add_long(std::uint64_t ticks);
 
     std::array<std::uint32_t, single_ticks> counts_{};
     std::array<std::uint64_t, 64> powers_{}; // longer ones, by the power of two below them
-    std::uint64_t longest_ = 0;
+    std::uint64_t longest_ = 0;              // of those not counted one by one
 };
 
 struct thread_order {

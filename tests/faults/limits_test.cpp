@@ -140,7 +140,7 @@ TEST(DescriptorLimitOfTheProcess, DoesNoHarm)
 }
 
 // With some room on the heap: the C library's compiler of patterns frees memory twice when it gets none half-way.
-rlim_t address_space_in_use()
+[[maybe_unused]] rlim_t address_space_in_use()
 {
     void *volatile room = std::malloc(100000);
     std::free(room);

@@ -18,14 +18,17 @@ def draw(tables):
         return (f'<line class="grid" x1="{x:.1f}" y1="{TOP - 6}" x2="{x:.1f}" y2="{height - 28}"/>'
                 f'<text class="axis" x="{x:.1f}" y="{height - 10}" text-anchor="middle">{text}</text>')
 
-    parts = [line(LABELS + power * scale, f"{10 ** power:,} ns".replace(",", " ")) for power in range(longest + 1)]
+    def figure(ns):
+        return f"{ns:,.0f} ns".replace(",", " ")
+
+    parts = [line(LABELS + power * scale, figure(10 ** power)) for power in range(longest + 1)]
     for number, (_, system, ns, *_) in enumerate(rows):
         y = TOP + number * (BAR + GAP)
         kind = {"libqn_tr": "own", "floor": "floor"}.get(system, "other")
         parts.append(
             f'<text class="name" x="{LABELS - 10}" y="{y + 15}" text-anchor="end">{html.escape(system)}</text>'
             f'<rect class="{kind}" x="{LABELS}" y="{y}" width="{math.log10(max(ns, 1)) * scale:.1f}" height="{BAR}" rx="3"/>'
-            f'<text class="name" x="{LABELS + math.log10(max(ns, 1)) * scale + 8:.1f}" y="{y + 15}">{ns:,.0f} ns</text>')
+            f'<text class="name" x="{LABELS + math.log10(max(ns, 1)) * scale + 8:.1f}" y="{y + 15}">{figure(ns)}</text>')
     return f"""<svg xmlns="http://www.w3.org/2000/svg" viewBox="0 0 {WIDTH} {height}" role="img">
 <title>What a record of {RECORD} costs its writer</title>
 <style>

@@ -79,7 +79,7 @@ class Library(System):
         super().__init__(build, "libqn_tr", "library")
 
     def survivors(self, folder):
-        command = [self.build / "tools/qntrace/qntrace", "stats", "--json", "--comp", "BNCH", folder / "trace"]
+        command = [self.build / "tools/qntrace/qntrace", "stats", "--json", "--comp", "BNCH", folder]
         return json.loads(subprocess.check_output(command).splitlines()[0])["records"]
 
 

@@ -91,7 +91,7 @@ std::vector<attacked_call> starting_calls()
         {"SetFileMap", registered,
          [](const std::string &) { return tr_set_file_map_1(files().mapped.c_str(), "COMP:c[12]"); },
          [](const std::string &) { tr_set_filename_1(nullptr); }, pattern_codes},
-        {"SetFileSize", running, [](const std::string &) { return tr_set_file_size_1("", 3 * program_file_bytes); },
+        {"SetFileSize", running, [](const std::string &) { return tr_set_file_size_1("", large_file_bytes); },
          [](const std::string &folder) {
              unname_it(folder);
              remove_files(folder);

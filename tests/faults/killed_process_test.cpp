@@ -124,7 +124,11 @@ protected:
 
 TEST_F(KilledAtSystemCalls, AStartLeavesAFileThatIsStarted)
 {
-    kill_everywhere(registered, name_it, go_on_with_trace, [](const std::string &folder) {
+    const auto registered_with_large_file = [](const std::string &folder) {
+        registered(folder);
+        if (tr_set_size_1(large_file_bytes) != 0) _exit(1);
+    };
+    kill_everywhere(registered_with_large_file, name_it, go_on_with_trace, [](const std::string &folder) {
         EXPECT_TRUE(has_all(ids_of(trace_image::of_file(folder + "/app.trc")), first_later, later));
     });
 }
@@ -141,7 +145,7 @@ TEST_F(KilledAtSystemCalls, AStartOfAnExistingFileLeavesItsRecords)
 TEST_F(KilledAtSystemCalls, AnExtensionLeavesAFileThatIsStarted)
 {
     kill_everywhere(
-        with_records, [](const std::string &) { tr_set_file_size_1("", 3 * program_file_bytes); }, go_on_with_trace,
+        with_records, [](const std::string &) { tr_set_file_size_1("", large_file_bytes); }, go_on_with_trace,
         [](const std::string &folder) {
             EXPECT_TRUE(has_all(ids_of(trace_image::of_file(folder + "/app.trc")), first_later, later));
         });

@@ -9,6 +9,7 @@
 namespace qn::test
 {
 inline constexpr qn_uint32_t program_file_bytes = 8192;
+inline constexpr qn_uint32_t large_file_bytes = 6 * 65536; // comes about in several writes
 inline constexpr size_t copied_bytes = 300000;
 
 // The names that the calls are made with. They are there before the attack: it is not on the test.

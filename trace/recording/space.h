@@ -82,7 +82,7 @@ inline void stamp(trace_record_header_t *record)
 {
     // pthread_self(), without the call: on x86-64 it is the thread pointer.
     record->threadId = static_cast<qn_uint32_t>(reinterpret_cast<uintptr_t>(__builtin_thread_pointer()));
-    qn_uint64_t now = 0;
+    qn_uint64_t now;
     cu_get_ctr_1(&now);
     record->timeStamp = now;
 }

@@ -117,7 +117,7 @@ def contention(build, rounds):
     with Started(systems(build)) as compared:
         for threads in (2, 4):
             timed = in_turns(rounds, {system.name: lambda system=system: fairness(system.measure(
-                "--threads", threads, "--seconds", 0.5)) for system in compared})
+                "--threads", threads, "--seconds", 1)) for system in compared})
             single = in_turns(rounds, {system.name: lambda system=system: system.measure(
                 "--threads", threads, "--latency") for system in compared[:2]})
             for name in timed:

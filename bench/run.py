@@ -5,7 +5,8 @@
 
 BUILD is the build folder of the preset release. Every figure is the median over the rounds, and a ratio is the median of
 the ratios within each round: whatever the machine's mood is, it meets all systems of a round. --into puts the tables
-between two marker lines of a document, --svg draws what a record costs in each system.
+between two marker lines of a document, in the place of those of the same names; --svg draws what a record costs in each
+system.
 """
 import argparse
 import json

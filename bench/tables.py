@@ -1,4 +1,5 @@
 """Tables as text: columns of a name and of figures."""
+import re
 
 BEGIN = "<!-- measured: begin -->"
 END = "<!-- measured: end -->"
@@ -38,7 +39,10 @@ def as_text(of):
 
 
 def put_into(document, tables):
+    """Puts tables between the two lines of a document; those of other names stay there as they are."""
     head, rest = document.read_text(encoding="utf-8").split(BEGIN)
-    tail = rest.split(END)[1]
-    text = "\n".join(as_text(each) for each in tables)
+    measured, tail = rest.split(END)
+    texts = {text.split("\n", 1)[0]: text.rstrip() + "\n" for text in re.split(r"^(?=### )", measured, flags=re.M)[1:]}
+    texts |= {f"### {each['title']}": as_text(each) for each in tables}
+    text = "\n".join(texts.values())
     document.write_text(f"{head}{BEGIN}\n\n{text}\n{END}{tail}", encoding="utf-8")

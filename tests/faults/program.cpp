@@ -1,7 +1,9 @@
 #include "faults/program.h"
 
+#include <chrono>
 #include <cstdlib>
 #include <filesystem>
+#include <thread>
 
 #include <sys/wait.h>
 #include <unistd.h>
@@ -78,7 +80,8 @@ qn_int32_t write_ids(qn_uint32_t first, qn_uint32_t count)
 
 void wait_for_queue()
 {
-    for (;; usleep(100)) {
+    // Not usleep(): a thread is cancelled at each of its calls, and how long a copy takes is no matter for that.
+    for (;; std::this_thread::sleep_for(std::chrono::microseconds(100))) {
         const qn::tr::mutex_lock queue(spq.mutex);
         if (spq.cnt == 0) return;
     }

@@ -7,7 +7,7 @@ import threading
 import time
 
 from systems import Floor, Library, Scratch, systems
-from tables import table
+from tables import as_figure, table
 
 KINDS = {"id": "an identifier", "values": "two 64-bit values", "string": "a string of 32 bytes",
          "formatted": "a text of two integers", "data": "a block of 64 bytes"}
@@ -106,8 +106,8 @@ def all_in(build, rounds):
                      1e9 * (median(results["all"], "all_seconds") - started) / records,
                      records - min(result["survived"] for result in results["all"])])
     yield table("all_in", "All in", ["system", "writer ns", "CPU ns, everybody's", "records lost"], rows,
-                f"{records:,} records of two 64-bit values, then SIGKILL at once; what cannot be read then is lost. CPU "
-                "time is that of all threads and daemons, less that of a run with one record.".replace(",", " ", 1))
+                f"{as_figure(records)} records of two 64-bit values, then SIGKILL at once; what cannot be read then is "
+                "lost. CPU time is that of all threads and daemons, less that of a run with one record.")
 
 
 def contention(build, rounds):
@@ -237,7 +237,9 @@ def page_sets(build, rounds):
         with Scratch() as folder:
             result = library.run(folder, "--ring", pages * page_bytes, "--warm-up", warm_up, "--burst", burst,
                                  "--pause", pause, "--seconds", 2, *options)
-            return result | {"lost": result["records"] + warm_up - library.survivors(folder)}
+            if "--pages" in options:
+                result["lost"] = result["records"] + warm_up - library.survivors(folder)
+            return result
 
     rows = []
     for pause in (500, 5_000):
@@ -245,7 +247,7 @@ def page_sets(build, rounds):
         single = in_turns(rounds, {"single file": lambda: run(pause, "--latency"),
                                    "page set": lambda: run(pause, "--pages", pages, "--latency")})
         for name in timed:
-            lost = max(result["lost"] for result in timed[name] + single[name]) if name == "page set" else None
+            lost = max((result["lost"] for result in timed[name] + single[name] if "lost" in result), default=None)
             rows.append([f"a quarter of a page, {pause / 1000:g} ms", name, median(timed[name], "ns"),
                          ratio(timed[name], timed["single file"], "ns"), median(single[name], "p99.9"),
                          median(single[name], "p99.99"), median(single[name], "longest") / 1000, lost])
@@ -277,25 +279,26 @@ def steps_of(command, rounds):
     return {name: {field: median(results, field) for field in results[0]} for name, results in steps.items()}
 
 
+def beside_work(name, title, steps, work):
+    """A table of steps; those that tell their "work_ms" are set beside it."""
+    rows = [[step, of["ms"], of.get("work_ms"), of["ms"] / of["work_ms"] if "work_ms" in of else None]
+            for step, of in steps.items()]
+    return table(name, title, ["step", "ms", "the work itself ms", "ratio"], rows, f"The work itself: {work}")
+
+
 def control_path(build, rounds):
     """Registering and specifying."""
-    steps = steps_of([build / "bench/control_path"], min(rounds, 3))
-    rows = [[name, step["ms"], step.get("work_ms"), step["ms"] / step["work_ms"] if "work_ms" in step else None]
-            for name, step in steps.items()]
-    yield table("control_path", "Control", ["step", "ms", "the work itself ms", "ratio"], rows,
-                "The work itself: in each call, each pattern that may concern it is compiled once and matched with the names.")
+    yield beside_work("control_path", "Control", steps_of([build / "bench/control_path"], min(rounds, 3)),
+                      "in each call, each pattern that may concern it is compiled once and matched with the names.")
 
 
 def start_stop(build, rounds):
     """A trace of 1 GiB."""
     steps = steps_of([build / "bench/start_stop"], min(rounds, 3))
-    work = {"start a new trace": "write the bytes", "start the full trace again": "map and read the bytes"}
-    rows = []
-    for name, step in steps.items():
-        least = steps[work[name]]["ms"] if name in work else None
-        rows.append([name, step["ms"], least, step["ms"] / least if least else None])
-    yield table("start_stop", "Starting and stopping a trace of 1 GiB", ["step", "ms", "the work itself ms", "ratio"],
-                rows, "The work itself: 1 GiB is written to a new file and synced, or mapped and read, a word of each cache line.")
+    steps["start a new trace"]["work_ms"] = steps["write the bytes"]["ms"]
+    steps["start the full trace again"]["work_ms"] = steps["map and read the bytes"]["ms"]
+    yield beside_work("start_stop", "Starting and stopping a trace of 1 GiB", steps,
+                      "1 GiB is written to a new file and synced, or mapped and read, a word of each cache line.")
 
 
 def instructions(build, _rounds):

@@ -2,6 +2,8 @@
 import html
 import math
 
+from tables import as_figure
+
 WIDTH, LABELS, BAR, GAP, TOP = 760, 190, 20, 8, 56
 RECORD = "two 64-bit values"
 
@@ -19,7 +21,7 @@ def draw(tables):
                 f'<text class="axis" x="{x:.1f}" y="{height - 10}" text-anchor="middle">{text}</text>')
 
     def figure(ns):
-        return f"{ns:,.0f} ns".replace(",", " ")
+        return f"{as_figure(ns)} ns"
 
     parts = [line(LABELS + power * scale, figure(10 ** power)) for power in range(longest + 1)]
     for number, (_, system, ns, *_) in enumerate(rows):

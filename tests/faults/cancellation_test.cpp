@@ -65,9 +65,10 @@ TEST_P(Cancellation, AtEachPointLeavesEveryLockFree)
     const attacked_call call = cancelled_form_of(*GetParam());
     const aftermath undisturbed = play_in_child(call, cancel_at(0));
     ASSERT_EQ(undisturbed.stage, aftermath::ended) << undisturbed.how_it_ended();
+    const uint32_t times = rounds(1, 50);
     uint64_t executions = 0;
     uint64_t cancelled = 0;
-    for (uint32_t round = 0; round < rounds(1, 50) && !HasFailure(); ++round)
+    for (uint32_t round = 0; round < times && !HasFailure(); ++round)
         for (uint64_t point = 1;; point += rounds(stride, 1)) {
             SCOPED_TRACE("point " + std::to_string(point));
             const aftermath told = play_in_child(call, cancel_at(point));
@@ -76,7 +77,7 @@ TEST_P(Cancellation, AtEachPointLeavesEveryLockFree)
             if (told.stage != aftermath::ended || told.status != was_cancelled) break;
             ++cancelled;
         }
-    count("Cancellation at every point", "rounds", rounds(1, 50));
+    count("Cancellation at every point", "rounds", times);
     count("Cancellation at every point", "faults", cancelled);
     count("Cancellation at every point", "executions", executions);
 }

@@ -17,6 +17,7 @@
 #include <gtest/gtest.h>
 
 #include "faults/campaign.h"
+#include "faults/program.h"
 #include "recording/numbered_records.h"
 #include "recording/one_trace.h"
 #include "trace/trace.h"
@@ -194,13 +195,7 @@ protected:
         silence = true;
         const std::unique_lock still(gate);
         silence = false;
-        for (;;) {
-            {
-                const qn::tr::mutex_lock queue(spq.mutex);
-                if (spq.cnt == 0) break;
-            }
-            usleep(1000);
-        }
+        wait_for_queue();
         body();
     }
 

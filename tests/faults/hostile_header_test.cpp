@@ -115,14 +115,9 @@ protected:
 
     static bool queue_empties()
     {
-        for (int waits = 0; waits < 100; ++waits) {
-            {
-                const qn::tr::mutex_lock queue(spq.mutex);
-                if (spq.cnt == 0) return true;
-            }
+        for (int waits = 0; waits < 100 && !queue_is_empty(); ++waits)
             std::this_thread::sleep_for(std::chrono::milliseconds(1));
-        }
-        return false;
+        return queue_is_empty();
     }
 
     // A page that was queued, and taken over because its file said that it was copied, stays in the queue until it is full

@@ -78,13 +78,16 @@ qn_int32_t write_ids(qn_uint32_t first, qn_uint32_t count)
     return status;
 }
 
+bool queue_is_empty()
+{
+    const qn::tr::mutex_lock queue(spq.mutex);
+    return spq.cnt == 0;
+}
+
 void wait_for_queue()
 {
     // Not usleep(): a thread is cancelled at each of its calls, and how long a copy takes is no matter for that.
-    for (;; std::this_thread::sleep_for(std::chrono::microseconds(100))) {
-        const qn::tr::mutex_lock queue(spq.mutex);
-        if (spq.cnt == 0) return;
-    }
+    while (!queue_is_empty()) std::this_thread::sleep_for(std::chrono::microseconds(100));
 }
 
 bool in_process(const std::function<bool()> &body)

@@ -45,6 +45,8 @@ void unname_it(const std::string &);
 // Records of 32 bytes with the ids first, first + 1, ...; the statuses or-ed together.
 qn_int32_t write_ids(qn_uint32_t first, qn_uint32_t count);
 
+bool queue_is_empty();
+
 // Until everything is copied.
 void wait_for_queue();
 

@@ -136,7 +136,7 @@ typedef struct cu_timeinfo {
 /*
  * Stores the counter in *ctr: the processor's time-stamp counter where it is invariant and the kernel trusts
  * it, otherwise the nanoseconds of CLOCK_MONOTONIC. The choice never changes while the process lives. Costs
- * what reading the counter costs. ctr must not be null. Also safe in signal handlers.
+ * what reading the counter costs. ctr must not be null and may have any alignment. Also safe in signal handlers.
  */
 QN_EXPORT void cu_get_ctr_1(qn_uint64_t *ctr);
 

@@ -12,6 +12,7 @@
 #include <algorithm>
 #include <atomic>
 #include <cpuid.h>
+#include <cstring>
 #include <ctime>
 #include <string_view>
 #include <sys/prctl.h>
@@ -95,9 +96,7 @@ bool kernel_keeps_time_by_tsc() { return names_tsc(present_source); }
 void cu_get_ctr_1(qn_uint64_t *ctr)
 {
     using namespace qn::cu;
-    if (chosen.load(std::memory_order_relaxed) == counter_source::time_stamp_counter) [[likely]] {
-        *ctr = __rdtsc();
-    } else {
-        *ctr = read_otherwise();
-    }
+    const bool tsc = chosen.load(std::memory_order_relaxed) == counter_source::time_stamp_counter;
+    const uint64_t now = __builtin_expect(tsc, 1) ? __rdtsc() : read_otherwise();
+    std::memcpy(ctr, &now, sizeof now);
 }

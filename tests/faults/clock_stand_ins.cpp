@@ -1,5 +1,6 @@
 #include "faults/clock_stand_ins.h"
 
+#include <cstring>
 #include <ctime>
 #include <dlfcn.h>
 #include <sys/syscall.h>
@@ -34,7 +35,8 @@ void cu_get_ctr_1(qn_uint64_t *counter)
 {
     const qn_uint64_t value = __builtin_ia32_rdtsc();
     const counter_change change = changed_counter;
-    *counter = change != nullptr ? change(value) : value;
+    const qn_uint64_t changed = change != nullptr ? change(value) : value;
+    std::memcpy(counter, &changed, sizeof changed);
 }
 
 int clock_gettime(clockid_t clock, timespec *now) noexcept

@@ -5,6 +5,7 @@
 #include <atomic>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <filesystem>
 #include <functional>
 #include <map>
@@ -33,7 +34,11 @@ std::atomic<suseconds_t> microseconds{0}; // that the clock has been asked for
 
 // The program's own counter, clock, process id and command.
 extern "C" {
-void cu_get_ctr_1(qn_uint64_t *counter) { *counter = ++ticks; }
+void cu_get_ctr_1(qn_uint64_t *counter)
+{
+    const qn_uint64_t now = ++ticks;
+    std::memcpy(counter, &now, sizeof now);
+}
 
 int gettimeofday(timeval *now, void *) noexcept
 {

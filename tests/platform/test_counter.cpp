@@ -1,5 +1,6 @@
 // The counter: usable at any time, never going back, the same choice for everybody.
 #include <cstdlib>
+#include <cstring>
 #include <sys/mount.h>
 #include <thread>
 #include <vector>
@@ -23,6 +24,19 @@ qn_uint64_t counter()
 // Runs before the constructors of the library, which have no priority.
 qn_uint64_t counter_before_constructors = 0;
 [[gnu::constructor(101)]] void read_early() { counter_before_constructors = counter(); }
+
+TEST(Counter, IsStoredAtAnyAlignment)
+{
+    alignas(qn_uint64_t) unsigned char place[2 * sizeof(qn_uint64_t) + 1] = {};
+    for (size_t offset = 0; offset <= sizeof(qn_uint64_t); ++offset) {
+        const qn_uint64_t before = counter();
+        cu_get_ctr_1(reinterpret_cast<qn_uint64_t *>(place + offset));
+        qn_uint64_t stored = 0;
+        std::memcpy(&stored, place + offset, sizeof stored);
+        EXPECT_GE(stored, before);
+        EXPECT_LE(stored, counter());
+    }
+}
 
 TEST(Counter, CountsBeforeTheLibrarysConstructors)
 {

@@ -16,8 +16,8 @@
 
 // Its mutex, the global one, needs no creation: a record writer may be the first call of a program.
 constinit trace_anchor_t anchors = {.anchorMutex = PTHREAD_RECURSIVE_MUTEX_INITIALIZER_NP,
-                                    .mapFd = -1,
                                     .seqNumber = 1,
+                                    .mapFd = -1,
                                     .uRequestedFileSize = default_file_size,
                                     .numAnchors = 1};
 

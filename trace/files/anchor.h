@@ -26,20 +26,24 @@ inline constexpr int format_buffer_bytes = 1024;
 inline constexpr qn_uint32_t default_file_size = 65536;
 
 struct trace_anchor {
-    int bInitialized;            // default anchor: init() has run. Global mutex
-    int bMultipageEnabled;       // default anchor: traces may be split into pages. Global mutex
-    pthread_mutex_t anchorMutex; // recursive; the default anchor's is the global mutex
-    int mapFd;                   // while the file is being opened, else -1
-    dev_t fileDevice;            // which file is mapped. Spool queue mutex, as are the following two
+    // What every record touches: two cache lines.
+    pthread_mutex_t anchorMutex;  // recursive; the default anchor's is the global mutex
+    pthread_mutex_t *pSpoolMutex; // recursive, shared by the page set and owned by its head; null: a single file
+    unsigned char *pMap;          // the file header; null while the file is not mapped
+    trace_record_header_t *pNextFree;
+    unsigned char *pMapEnd;      // one past the mapping
+    qn_uint32_t seqNumber;       // of the last record
+    qn_uint32_t uMaxSize;        // longest record; 0 while the file is not started. Also read without the lock
+    trace_anchor_t **ppActivePg; // every page: the head's pActivePg
+
+    int bInitialized;      // default anchor: init() has run. Global mutex
+    int bMultipageEnabled; // default anchor: traces may be split into pages. Global mutex
+    int mapFd;             // while the file is being opened, else -1
+    dev_t fileDevice;      // which file is mapped. Spool queue mutex, as are the following two
     ino_t fileNode;
     trace_anchor_t *nextClaimed;
-    unsigned char *pMap;    // the file header; null while the file is not mapped
-    unsigned char *pMapEnd; // one past the mapping
-    qn_uint32_t seqNumber;  // of the last record
-    trace_record_header_t *pNextFree;
     trace_record_header_t *pWrap;         // where a lap of the ring begins: behind a page's notice
     trace_record_header_t *pRing;         // start of the ring, as it was found at the start
-    qn_uint32_t uMaxSize;                 // longest record; 0 while the file is not started. Also read without the lock
     qn_int32_t pageSize;                  // of memory
     component_anchor_t *pFirstComp;       // default anchor. Global mutex and component list mutex
     char fileName[trace_file_name_bytes]; // empty: no file. Global mutex; a page set's head has its first page's name
@@ -55,12 +59,10 @@ struct trace_anchor {
     qn_uint32_t numAnchors;           // default anchor: length of the list. Anchor list mutex
     trace_anchor_t *next;             // next trace file; written under the anchor list mutex, followed without
     qn_uint32_t alloc_cnt;
-    trace_spool_spec_t *spool;    // governs this file; null: none
-    trace_anchor_t *nextPage;     // ring of the page set; null: a single file
-    int bSpoolProcessed;          // `spool` has been looked for. Global mutex
-    pthread_mutex_t *pSpoolMutex; // recursive, shared by the page set and owned by its head; null: a single file
-    trace_anchor_t *pActivePg;    // head: the page being written
-    trace_anchor_t **ppActivePg;  // every page: the head's pActivePg
+    trace_spool_spec_t *spool; // governs this file; null: none
+    trace_anchor_t *nextPage;  // ring of the page set; null: a single file
+    int bSpoolProcessed;       // `spool` has been looked for. Global mutex
+    trace_anchor_t *pActivePg; // head: the page being written
     qn_uint32_t consecutiveSpoolNotCopied;
     trace_anchor_t *p_head_spool_anchor;
     trace_anchor_t *p_obsolete_pages; // head: pages cut off and not yet copied

@@ -21,7 +21,12 @@ int unlockGlobalMutex(void) { return qn::tr::unlock_mutex(&anchors.anchorMutex);
 
 void mutex_cleanup(void *mutex) { qn::tr::unlock_mutex(static_cast<pthread_mutex_t *>(mutex)); }
 
-int lock_anchor_set(trace_anchor_t *anchor) { return qn::tr::take_anchor_set(anchor).result; }
+int lock_anchor_set(trace_anchor_t *anchor)
+{
+    int result = 0;
+    qn::tr::take_anchor_set(anchor, result);
+    return result;
+}
 
 int unlock_anchor_set(trace_anchor_t *anchor) { return qn::tr::unlock_mutex(qn::tr::anchor_set_mutex(anchor)); }
 
@@ -31,8 +36,9 @@ namespace qn::tr
 {
 constinit thread_local int guards_of_thread = 0;
 
-int lock_busy_mutex(pthread_mutex_t *mutex)
+int lock_busy_mutex(pthread_mutex_t *mutex, int result_of_try)
 {
+    if (result_of_try != EBUSY) return result_of_try;
     // Twice as long, and more records are written in all, but some wait longer than if all had slept at once.
     constexpr int first_pauses = 12;
     constexpr int last_pauses = 48;
@@ -42,6 +48,20 @@ int lock_busy_mutex(pthread_mutex_t *mutex)
         if (result != EBUSY) return result;
     }
     return pthread_mutex_lock(mutex);
+}
+
+pthread_mutex_t *take_anchor_set(trace_anchor_t *anchor, int &result)
+{
+    for (;;) {
+        pthread_mutex_t *mutex = anchor_set_mutex(anchor);
+        const lock_rank rank = mutex == &anchor->anchorMutex ? lock_rank::file : lock_rank::set;
+        expect_in_order(mutex, rank);
+        result = lock_briefly_held(mutex);
+        if (result != 0) return nullptr;
+        note_taken(mutex, rank);
+        if (mutex == anchor_set_mutex(anchor)) return mutex;
+        unlock_mutex(mutex);
+    }
 }
 
 void reset_locks_in_child()

@@ -16,13 +16,14 @@
 //
 // All of them are recursive. A guard releases its lock when it goes out of scope, also when the thread is cancelled:
 // cancellation unwinds the stack like an exception. So nothing between a guard and a cancellation point may be noexcept.
+// The guards that record writers use are inlined even where the stack is unwound: a call there, with the guard's address,
+// would keep the guard in memory for every record.
 #pragma once
 
 #include <atomic>
 #include <cerrno>
 #include <optional>
 #include <pthread.h>
-#include <sys/single_threaded.h>
 
 #include "trace/files/anchor.h"
 #include "trace/files/lock_ranks.h"
@@ -69,7 +70,7 @@ public:
     }
     guard_mark(const guard_mark &) = delete;
     guard_mark &operator=(const guard_mark &) = delete;
-    ~guard_mark()
+    [[gnu::always_inline]] ~guard_mark()
     {
         std::atomic_signal_fence(std::memory_order_seq_cst);
         guards_of_thread = before_;
@@ -169,60 +170,65 @@ inline pthread_mutex_t *anchor_set_mutex(trace_anchor_t *anchor)
     return shared != nullptr && load_relaxed(anchor->spool) != nullptr ? shared : &anchor->anchorMutex;
 }
 
-// Takes a mutex that another thread holds: tries for some microseconds, which is what a record takes, then waits.
-int lock_busy_mutex(pthread_mutex_t *mutex);
+// Goes on after a try that did not take the mutex: when another thread holds it, tries for some microseconds, which is
+// what a record takes, then waits. Any other result of the try is final.
+[[gnu::cold]] int lock_busy_mutex(pthread_mutex_t *mutex, int result_of_try);
 
 // pthread_mutex_lock() for a lock that is held for an instant only. With two writers on one trace, to sleep and be woken
-// costs many times the record that was waited for. A process of one thread need not even use an atomic operation.
+// costs many times the record that was waited for.
 inline int lock_briefly_held(pthread_mutex_t *mutex)
 {
 #ifdef __SANITIZE_THREAD__
     return pthread_mutex_lock(mutex); // the order of locks is not learned from trying
 #else
-    if (__libc_single_threaded) return pthread_mutex_lock(mutex);
     const int result = pthread_mutex_trylock(mutex);
-    return __builtin_expect(result == EBUSY, 0) ? lock_busy_mutex(mutex) : result;
+    return __builtin_expect(result == 0, 1) ? 0 : lock_busy_mutex(mutex, result);
 #endif
 }
 
-// Takes the anchor set lock and tells which mutex that was; the lock's result. A start may turn a single file into a
-// page set, whose lock is another one, while a thread waits: so it looks again when it has the mutex.
-struct taken_mutex {
-    pthread_mutex_t *mutex;
-    int result;
-};
+// Takes the anchor set lock and returns which mutex that was; null when it could not be taken, with the lock's result in
+// `result`. A start may turn a single file into a page set, whose lock is another one, while a thread waits: so it looks
+// again when it has the mutex.
+pthread_mutex_t *take_anchor_set(trace_anchor_t *anchor, int &result);
 
-inline taken_mutex take_anchor_set(trace_anchor_t *anchor)
+// The same, inline for what it nearly always is: a single file's own mutex.
+[[gnu::always_inline]] inline pthread_mutex_t *take_file_or_set(trace_anchor_t *anchor, int &result)
 {
-    for (;;) {
-        pthread_mutex_t *mutex = anchor_set_mutex(anchor);
-        const lock_rank rank = mutex == &anchor->anchorMutex ? lock_rank::file : lock_rank::set;
-        expect_in_order(mutex, rank);
-        const int result = lock_briefly_held(mutex);
-        if (__builtin_expect(result != 0, 0)) return {mutex, result};
-        note_taken(mutex, rank);
-        if (__builtin_expect(mutex == anchor_set_mutex(anchor), 1)) return {mutex, 0};
-        unlock_mutex(mutex);
+    if (__builtin_expect(load_acquire(anchor->pSpoolMutex) == nullptr, 1)) {
+        pthread_mutex_t *own = &anchor->anchorMutex;
+        expect_in_order(own, lock_rank::file);
+        result = lock_briefly_held(own);
+        if (__builtin_expect(result != 0, 0)) return nullptr;
+        note_taken(own, lock_rank::file);
+        if (__builtin_expect(load_acquire(anchor->pSpoolMutex) == nullptr, 1)) return own;
+        unlock_mutex(own);
     }
+    int of_set = 0; // so that the address of the caller's result is not taken
+    pthread_mutex_t *mutex = take_anchor_set(anchor, of_set);
+    result = of_set;
+    return mutex;
 }
 
 // Holds an anchor set lock. It releases the mutex that it took, whatever a start made of the anchor meanwhile.
 class anchor_set_lock
 {
 public:
-    explicit anchor_set_lock(trace_anchor_t *anchor) : taken_(take_anchor_set(anchor)) {}
+    [[gnu::always_inline]] explicit anchor_set_lock(trace_anchor_t *anchor) : mutex_(take_file_or_set(anchor, result_))
+    {
+    }
     anchor_set_lock(const anchor_set_lock &) = delete;
     anchor_set_lock &operator=(const anchor_set_lock &) = delete;
-    ~anchor_set_lock()
+    [[gnu::always_inline]] ~anchor_set_lock()
     {
-        if (taken_.result == 0) unlock_mutex(taken_.mutex);
+        if (mutex_ != nullptr) unlock_mutex(mutex_);
     }
-    explicit operator bool() const { return taken_.result == 0; }
-    int result() const { return taken_.result; }
+    explicit operator bool() const { return mutex_ != nullptr; }
+    int result() const { return result_; }
 
 private:
     guard_mark mark_;
-    taken_mutex taken_;
+    int result_ = 0;
+    pthread_mutex_t *mutex_;
 };
 
 // Holds the lock of the page set that a single file may become. Binding the file to a specification makes that one its set

@@ -116,6 +116,13 @@ constinit thread_local int fresh_start::in_progress_ = 0;
     record->length = bytes_to_end(anchor, record);
 }
 
+// Where the ring is read from when the free pointer is at `next_free`; at the end of the file, from the ring's start.
+qn_uint32_t oldest_offset(trace_anchor_t *anchor, const unsigned char *next_free)
+{
+    if (next_free == anchor->pMapEnd) return header_of(anchor)->uOffset;
+    return static_cast<qn_uint32_t>(next_free - anchor->pMap);
+}
+
 // Closes off the rest of the file behind the free pointer, and goes back to the start of the ring.
 [[gnu::noinline]] void wrap_round(trace_anchor_t *anchor, qn_uint32_t consumed)
 {
@@ -157,6 +164,11 @@ constinit thread_local int fresh_start::in_progress_ = 0;
 trace_record_header_t *allocate_space(trace_anchor_t *pAnchor, unsigned int *pReqLength)
 {
     return allocate_space_page(page_to_write(pAnchor), pReqLength);
+}
+
+trace_record_header_t *qn::tr::reserve_otherwise(trace_anchor_t *anchor, unsigned int requested)
+{
+    return allocate_space(anchor, &requested);
 }
 
 trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int *pReqLength)
@@ -213,7 +225,9 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
 
     trace_record_header_t *record = nullptr;
     if (consumed == needed || address(pAnchor->pNextFree) + requested <= end - record_header_bytes) {
-        record = claim(pAnchor, static_cast<qn_uint32_t>(consumed), requested);
+        record = pAnchor->pNextFree;
+        unsigned char *next_free = cut_record(pAnchor, record, static_cast<qn_uint32_t>(consumed), requested);
+        move_free_pointer(pAnchor, next_free, oldest_offset(pAnchor, next_free));
     } else if (is_multipage(pAnchor)) {
         return pageFull(pAnchor, pReqLength);
     } else {

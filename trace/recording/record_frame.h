@@ -34,20 +34,24 @@ struct record_writer {
     static qn_int32_t check_locked(const trace_anchor_t *) { return 0; }
 };
 
+// A component identifier whose memory page ends before its fourth byte: the next page may not exist.
+[[gnu::cold, gnu::noinline]] inline qn_uint32_t component_id_at_page_end(const char *from)
+{
+    qn_uint32_t bytes = 0;
+    for (unsigned i = 0; i < sizeof bytes && from[i] != '\0'; ++i)
+        bytes |= static_cast<qn_uint32_t>(static_cast<unsigned char>(from[i])) << (8 * i);
+    return bytes;
+}
+
 // Copies a component identifier as the one word that the record holds. A shorter identifier contributes the bytes
-// behind its end, unless these lie in another memory page, which may not exist.
+// behind its end.
 __attribute__((no_sanitize("address"))) inline void copy_component_id(char *to, const char *from)
 {
     struct [[gnu::packed, gnu::may_alias]] word { qn_uint32_t bytes; };
     constexpr uintptr_t memory_page = 4096;
-    qn_uint32_t bytes = 0;
-    if (__builtin_expect(reinterpret_cast<uintptr_t>(from) % memory_page <= memory_page - sizeof bytes, 1)) {
-        bytes = reinterpret_cast<const word *>(from)->bytes;
-    } else {
-        for (unsigned i = 0; i < sizeof bytes && from[i] != '\0'; ++i)
-            bytes |= static_cast<qn_uint32_t>(static_cast<unsigned char>(from[i])) << (8 * i);
-    }
-    reinterpret_cast<word *>(to)->bytes = bytes;
+    const bool readable = reinterpret_cast<uintptr_t>(from) % memory_page <= memory_page - sizeof(word);
+    reinterpret_cast<word *>(to)->bytes =
+        __builtin_expect(readable, 1) ? reinterpret_cast<const word *>(from)->bytes : component_id_at_page_end(from);
 }
 
 template <class Writer>
@@ -61,16 +65,16 @@ template <class Writer>
 
     if (interrupts_a_guard()) return QN_TR_ELOCK;
     const anchor_set_lock set(anchor);
-    if (!set) return QN_TR_ELOCK;
+    if (__builtin_expect(!set, 0)) return QN_TR_ELOCK;
     status = writer.check_locked(anchor);
     // Not even the fixed part fits: the trace is not active, or its ring is tiny.
-    if (status != 0 || anchor->uMaxSize < sizeof(typename Writer::record)) return status;
+    if (status != 0 || __builtin_expect(anchor->uMaxSize < sizeof(typename Writer::record), 0)) return status;
     unsigned int length = 0;
     status = writer.size(anchor, length);
     if (status != 0) return status == nothing_to_write ? 0 : status;
 
     trace_record_header_t *header = reserve(anchor, length);
-    if (header == nullptr) return 0;
+    if (__builtin_expect(header == nullptr, 0)) return 0;
     copy_component_id(header->compId, comp_id);
     writer.fill(reinterpret_cast<typename Writer::record *>(header));
     keep_store_order();

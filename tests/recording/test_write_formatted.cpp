@@ -34,6 +34,16 @@ TEST(FormattedWriter, FillsTheInsertsIn)
     expect_record(trace.only_record(), strings, "COMP", one_string("part:   -42 of 0xABCDEF012345, 2.50%"));
 }
 
+TEST(FormattedWriter, FillsNumbersTextsAndWidthsIn)
+{
+    const one_trace trace;
+    EXPECT_EQ(tr_record_fmt_string_1("COMP", 7, "%s of %lu (%-4d|%04hhX|%c) at %p: %i%%", "part", 1234567890123UL, -5,
+                                     300, 'x', reinterpret_cast<void *>(0xABCDE), 100),
+              0);
+    expect_record(trace.only_record(), strings, "COMP",
+                  one_string("part of 1234567890123 (-5  |002C|x) at 0xabcde: 100%"));
+}
+
 TEST(FormattedWriter, TakesATextWithoutInserts)
 {
     const one_trace trace;
@@ -105,6 +115,14 @@ TEST(FormattedWriter, EndsTheTextAtANulThatAnInsertBrings)
 {
     const one_trace trace;
     EXPECT_EQ(tr_record_fmt_string_1("COMP", 7, "ab%cde", '\0'), 0);
+    expect_record(trace.only_record(), strings, "COMP", one_string("ab"));
+}
+
+TEST(FormattedWriter, EndsALongTextAtANulThatAnInsertBrings)
+{
+    const one_trace trace;
+    const std::string rest(2000, 'r');
+    EXPECT_EQ(tr_record_fmt_string_1("COMP", 7, "ab%c%s", '\0', rest.c_str()), 0);
     expect_record(trace.only_record(), strings, "COMP", one_string("ab"));
 }
 

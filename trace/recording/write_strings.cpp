@@ -2,9 +2,9 @@
 #include <algorithm>
 #include <array>
 #include <cstdarg>
-#include <cstdio>
 #include <cstring>
 
+#include "trace/recording/format_text.h"
 #include "trace/recording/record_frame.h"
 
 namespace
@@ -88,14 +88,13 @@ struct formatted_writer : record_writer {
         return format == nullptr || format[0] == '\0' ? QN_TR_ENOFORMAT : 0;
     }
 
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wformat-nonliteral" // the exported calls check the client's format
     qn_int32_t size(trace_anchor_t *anchor, unsigned int &length)
     {
         if (anchor->uMaxSize == sizeof(record)) return nothing_to_write; // no room for a terminator
-        if (std::vsnprintf(anchor->buffer, sizeof anchor->buffer, format, arguments) < 0) return QN_TR_EFORMAT;
+        size_t characters = 0;
+        if (format_text(anchor->buffer, sizeof anchor->buffer, format, arguments, characters) < 0) return QN_TR_EFORMAT;
         text = anchor->buffer;
-        text_size = static_cast<qn_uint32_t>(std::strlen(text)) + 1;
+        text_size = static_cast<qn_uint32_t>(characters) + 1;
         length = format::strings_record_bytes(text_size);
         if (length > anchor->uMaxSize) {
             length = anchor->uMaxSize;
@@ -103,7 +102,6 @@ struct formatted_writer : record_writer {
         }
         return 0;
     }
-#pragma GCC diagnostic pop
 
     void fill(trace_record_strings_t *to) const
     {

@@ -1,0 +1,71 @@
+#include "recording/both_texts.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include <gtest/gtest.h>
+
+#include "trace/recording/format_text.h"
+
+namespace qn::test
+{
+namespace
+{
+constexpr size_t beyond = 64; // more than a number, or what stands behind the buffer
+
+struct both_texts {
+    int expected = 0;
+    int result = 0;
+};
+
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral"
+both_texts compare(size_t size, const char *format, va_list args)
+{
+    std::vector<char> expected(size + beyond, '#');
+    std::vector<char> text(size + beyond, '#');
+    both_texts results;
+    size_t length = 0;
+
+    va_list copy;
+    va_copy(copy, args);
+    errno = EISDIR;
+    results.expected = std::vsnprintf(expected.data(), size, format, copy);
+    const int expected_errno = errno;
+    va_end(copy);
+    va_copy(copy, args);
+    errno = EISDIR;
+    results.result = tr::format_text(text.data(), size, format, copy, length);
+    EXPECT_EQ(errno, expected_errno);
+    va_end(copy);
+
+    EXPECT_EQ(results.result, results.expected);
+    EXPECT_EQ(std::string(text.data() + size, beyond), std::string(beyond, '#'));
+    if (size == 0 || results.expected < 0) return results;
+    EXPECT_EQ(length, std::strlen(text.data()));
+    // A NUL that %c brings is not the end.
+    const size_t kept = std::min(size, static_cast<size_t>(results.expected) + 1);
+    EXPECT_EQ(std::string(text.data(), kept), std::string(expected.data(), kept));
+    return results;
+}
+#pragma GCC diagnostic pop
+} // namespace
+
+void expect_as_vsnprintf(const char *format, ...)
+{
+    va_list args;
+    va_start(args, format);
+    const int length = compare(0, format, args).expected;
+    for (size_t size = 1; size <= static_cast<size_t>(std::max(length, 0)) + beyond; ++size) {
+        compare(size, format, args);
+        if (!testing::Test::HasFailure()) continue;
+        ADD_FAILURE() << '"' << format << "\" in " << size << " bytes";
+        break;
+    }
+    va_end(args);
+}
+} // namespace qn::test

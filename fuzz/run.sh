@@ -12,13 +12,13 @@ seconds=${1:-60}
 build=$PWD/build/fuzz
 
 CC=${CC:-clang} CXX=${CXX:-clang++} cmake -S fuzz -B "$build" -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo >/dev/null
-targets=(levels map sizes selection conf reader start where)
+targets=(levels map sizes selection conf format reader start where)
 cmake --build "$build" --target fuzz_planted "${targets[@]/#/fuzz_}" -- --quiet
 
 # A configuration file has a language of its own, and lines of 1022 characters in it. Trace files have some kilobytes
 # and no words, filter expressions a language too.
 declare -A longest=([conf]=4096 [reader]=8192 [start]=4097)
-declare -A words=([conf]=conf [reader]=trace [start]=trace [where]=where)
+declare -A words=([conf]=conf [format]=format [reader]=trace [start]=trace [where]=where)
 
 mkdir -p "$build/failed"
 if "$build/fuzz_planted" -max_total_time=60 -artifact_prefix="$build/planted-" >"$build/planted.log" 2>&1 ||

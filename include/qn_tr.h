@@ -322,8 +322,10 @@ QN_EXPORT qn_int32_t tr_ms_record_strings_v_1(const qn_char_t *pCompId, qn_uint3
 QN_EXPORT qn_int32_t tr_record_string_1(const qn_char_t *pCompId, const qn_char_t *pString);
 
 /*
- * Write one formatted string, cut to 1023 characters. The text is formatted under the trace file's lock. Return 33
- * when pFormat is NULL or empty, 28 when vsnprintf() fails; nothing is written then.
+ * Write one formatted string, cut to 1023 characters: the text of vsnprintf(), made under the trace file's lock. It
+ * takes less than half the time as long as pFormat has only %d %i %u %o %x %X %c %s %p and %%, with length modifiers,
+ * widths in digits and the flags - and 0; precisions, floating-point numbers and all the rest are left to vsnprintf()
+ * itself. Return 33 when pFormat is NULL or empty, 28 when vsnprintf() fails; nothing is written then.
  */
 QN_EXPORT qn_int32_t tr_record_fmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat,
                                             ...) QN_PRINTF_LIKE(3, 4);

@@ -1,8 +1,7 @@
 // The short way to space in the ring, for the records that ask for nothing special.
 //
-// Almost always the free pointer has a free rest and an old record or two behind it, none of them a start record, no
-// reader is at work in the file at that instant, and its end is not near. Then space is these few loads and stores,
-// inline in the writer.
+// Almost always the free pointer has a free rest and an old record or two behind it: nobody reads them, none of them is a
+// start record, and the end of the file is not near. Then space is these few loads and stores, inline in the writer.
 // Everything else goes the long way, allocate_space() in allocate.cpp, which tells the whole story.
 //
 // Anchor set lock, held by the caller.
@@ -23,10 +22,12 @@ inline trace_record_header_t *record_of(const unsigned char *address)
 
 // The end of the records from `first` on that together come to `needed` bytes; null when they are not plain, or many.
 // Every record is taken off the ring here: the loop is unrolled, which spares it a counter.
-[[gnu::always_inline]] inline const unsigned char *plain_end(const unsigned char *first, qn_uint64_t needed,
-                                                             const unsigned char *end)
+[[gnu::always_inline]] inline const unsigned char *plain_end(trace_anchor_t *anchor, const unsigned char *first,
+                                                             qn_uint64_t needed)
 {
     constexpr int most_records = 8;
+    const qn_uint32_t held_by_reader = load_relaxed(header_of(anchor)->uSeqLock);
+    const unsigned char *end = anchor->pMapEnd;
     const unsigned char *enough = first + needed;
     // Nearer to the end a place might have no room for a header.
     if (__builtin_expect(enough + format::record_header_bytes > end, 0)) return nullptr;
@@ -34,6 +35,7 @@ inline trace_record_header_t *record_of(const unsigned char *address)
 #pragma GCC unroll 8
     for (int records = 0; records < most_records; ++records) {
         const trace_record_header_t *record = record_of(at);
+        if (__builtin_expect(record->seqNumber == held_by_reader, 0)) return nullptr;
         if (__builtin_expect(record->function == static_cast<qn_uint16_t>(format::kind::start), 0)) return nullptr;
         at += record->length;
         if (__builtin_expect(at >= enough, 1)) return at <= end ? at : nullptr;
@@ -91,25 +93,17 @@ inline void stamp(trace_record_header_t *record)
     return active != nullptr && anchor->spool != nullptr && anchor->spool->onoff != 0 ? active : anchor;
 }
 
-// No reader holds a record, and none asks us to wait.
-inline bool no_reader(const trace_file_header_t *header)
-{
-    return __builtin_expect(load_relaxed(header->uSeqLock) == format::seq_lock_none, 1) &&
-           __builtin_expect(load_relaxed(header->uTailReq) == 0, 1);
-}
-
 // The long way, out of line.
 trace_record_header_t *reserve_otherwise(trace_anchor_t *anchor, unsigned int requested);
 
-// What the writers call. Readers, records that are too long and the end of a page take the long way.
+// What the writers call. A reader's request to wait, a record that is too long and the end of a page take the long way.
 [[gnu::always_inline]] inline trace_record_header_t *reserve(trace_anchor_t *anchor, unsigned int requested)
 {
     trace_anchor_t *page = page_to_write(anchor);
-    if (__builtin_expect(requested > page->uMaxSize, 0) || !no_reader(header_of(page)))
+    if (__builtin_expect(requested > page->uMaxSize || load_relaxed(header_of(page)->uTailReq) != 0, 0))
         return reserve_otherwise(anchor, requested);
     trace_record_header_t *record = page->pNextFree;
-    const unsigned char *end =
-        plain_end(address(record), qn_uint64_t{requested} + format::record_header_bytes, page->pMapEnd);
+    const unsigned char *end = plain_end(page, address(record), qn_uint64_t{requested} + format::record_header_bytes);
     if (__builtin_expect(end == nullptr, 0)) return reserve_otherwise(anchor, requested);
     unsigned char *next_free = cut_record(page, record, static_cast<qn_uint32_t>(end - address(record)), requested);
     move_free_pointer(page, next_free, static_cast<qn_uint64_t>(next_free - page->pMap));

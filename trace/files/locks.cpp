@@ -55,12 +55,8 @@ pthread_mutex_t *take_anchor_set(trace_anchor_t *anchor, int &result)
     for (;;) {
         pthread_mutex_t *mutex = anchor_set_mutex(anchor);
         const lock_rank rank = mutex == &anchor->anchorMutex ? lock_rank::file : lock_rank::set;
-        expect_in_order(mutex, rank);
-        result = lock_briefly_held(mutex);
-        if (result != 0) return nullptr;
-        note_taken(mutex, rank);
-        if (mutex == anchor_set_mutex(anchor)) return mutex;
-        unlock_mutex(mutex);
+        pthread_mutex_t *taken = take_if_right(anchor, mutex, rank, result);
+        if (taken != nullptr || result != 0) return taken;
     }
 }
 

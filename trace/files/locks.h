@@ -186,34 +186,45 @@ inline int lock_briefly_held(pthread_mutex_t *mutex)
 #endif
 }
 
+// Takes that mutex and returns it if it is the anchor's set lock. Null when it could not be taken, with the lock's result
+// in `result`; or, with 0 there, when it is the right one no more: a start may turn a single file into a page set while a
+// thread waits.
+[[gnu::always_inline]] inline pthread_mutex_t *take_if_right(trace_anchor_t *anchor, pthread_mutex_t *mutex,
+                                                             lock_rank rank, int &result)
+{
+    expect_in_order(mutex, rank);
+    result = lock_briefly_held(mutex);
+    if (__builtin_expect(result != 0, 0)) return nullptr;
+    note_taken(mutex, rank);
+    if (__builtin_expect(mutex == anchor_set_mutex(anchor), 1)) return mutex;
+    unlock_mutex(mutex);
+    return nullptr;
+}
+
 // Takes the anchor set lock and returns which mutex that was; null when it could not be taken, with the lock's result in
-// `result`. A start may turn a single file into a page set, whose lock is another one, while a thread waits: so it looks
-// again when it has the mutex.
+// `result`.
 pthread_mutex_t *take_anchor_set(trace_anchor_t *anchor, int &result);
 
-// The same, inline for what it nearly always is: a single file's own mutex.
-[[gnu::always_inline]] inline pthread_mutex_t *take_file_or_set(trace_anchor_t *anchor, int &result)
+// The same, inline as far as it is over at once: for a single file, and for a page set.
+[[gnu::always_inline]] inline pthread_mutex_t *take_anchor_set_inline(trace_anchor_t *anchor, int &result)
 {
-    if (__builtin_expect(load_acquire(anchor->pSpoolMutex) == nullptr, 1)) {
-        pthread_mutex_t *own = &anchor->anchorMutex;
-        expect_in_order(own, lock_rank::file);
-        result = lock_briefly_held(own);
-        if (__builtin_expect(result != 0, 0)) return nullptr;
-        note_taken(own, lock_rank::file);
-        if (__builtin_expect(load_acquire(anchor->pSpoolMutex) == nullptr, 1)) return own;
-        unlock_mutex(own);
-    }
-    int of_set = 0; // so that the address of the caller's result is not taken
-    pthread_mutex_t *mutex = take_anchor_set(anchor, of_set);
-    result = of_set;
-    return mutex;
+    pthread_mutex_t *shared = load_acquire(anchor->pSpoolMutex);
+    pthread_mutex_t *taken = __builtin_expect(shared == nullptr, 1)
+                                 ? take_if_right(anchor, &anchor->anchorMutex, lock_rank::file, result)
+                                 : take_if_right(anchor, shared, lock_rank::set, result);
+    if (__builtin_expect(taken != nullptr, 1) || result != 0) return taken;
+    int result_of_set = 0; // so that the address of the caller's result is not taken
+    taken = take_anchor_set(anchor, result_of_set);
+    result = result_of_set;
+    return taken;
 }
 
 // Holds an anchor set lock. It releases the mutex that it took, whatever a start made of the anchor meanwhile.
 class anchor_set_lock
 {
 public:
-    [[gnu::always_inline]] explicit anchor_set_lock(trace_anchor_t *anchor) : mutex_(take_file_or_set(anchor, result_))
+    [[gnu::always_inline]] explicit anchor_set_lock(trace_anchor_t *anchor)
+        : mutex_(take_anchor_set_inline(anchor, result_))
     {
     }
     anchor_set_lock(const anchor_set_lock &) = delete;

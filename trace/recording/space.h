@@ -21,7 +21,7 @@ inline trace_record_header_t *record_of(const unsigned char *address)
 }
 
 // The end of the records from `first` on that together come to `needed` bytes; null when they are not plain, or many.
-// Every record is taken off the ring here: the loop is unrolled, which spares it a counter.
+// One or two rounds of the loop are the rule; unrolled, they do without a counter.
 [[gnu::always_inline]] inline const unsigned char *plain_end(trace_anchor_t *anchor, const unsigned char *first,
                                                              qn_uint64_t needed)
 {
@@ -69,11 +69,11 @@ inline trace_record_header_t *record_of(const unsigned char *address)
 
 // What is at the free pointer is the oldest record.
 [[gnu::always_inline]] inline void move_free_pointer(trace_anchor_t *anchor, unsigned char *next_free,
-                                                     qn_uint64_t oldest_offset)
+                                                     qn_uint32_t oldest_offset)
 {
     keep_store_order();
     anchor->pNextFree = record_of(next_free);
-    store_relaxed(header_of(anchor)->uOldestRecordOffset, static_cast<qn_uint32_t>(oldest_offset));
+    store_relaxed(header_of(anchor)->uOldestRecordOffset, oldest_offset);
 }
 
 // Who writes, and when.
@@ -106,7 +106,7 @@ trace_record_header_t *reserve_otherwise(trace_anchor_t *anchor, unsigned int re
     const unsigned char *end = plain_end(page, address(record), qn_uint64_t{requested} + format::record_header_bytes);
     if (__builtin_expect(end == nullptr, 0)) return reserve_otherwise(anchor, requested);
     unsigned char *next_free = cut_record(page, record, static_cast<qn_uint32_t>(end - address(record)), requested);
-    move_free_pointer(page, next_free, static_cast<qn_uint64_t>(next_free - page->pMap));
+    move_free_pointer(page, next_free, static_cast<qn_uint32_t>(next_free - page->pMap));
     stamp(record);
     return record;
 }

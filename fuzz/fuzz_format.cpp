@@ -9,8 +9,11 @@
 #include "fuzz/fuzz_input.h"
 #include "trace/recording/format_text.h"
 
-// AddressSanitizer's own vsnprintf() reads on behind a format that ends within a conversion.
-extern "C" [[gnu::visibility("default")]] const char *__asan_default_options() { return "check_printf=0"; }
+// The sanitizers' own vsnprintf() reads on behind a format that ends within a conversion.
+extern "C" {
+[[gnu::visibility("default")]] const char *__asan_default_options() { return "check_printf=0"; }
+[[gnu::visibility("default")]] const char *__tsan_default_options() { return "check_printf=0"; }
+}
 
 namespace
 {

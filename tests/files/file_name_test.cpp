@@ -6,6 +6,7 @@
 
 #include "files/page_set.h"
 #include "files/support_calls.h"
+#include "trace/files/locks.h"
 
 namespace
 {
@@ -204,7 +205,8 @@ protected:
     void TearDown() override
     {
         EXPECT_EQ(tr_set_filename_1(nullptr), 0);
-        anchors.spool = nullptr;
+        const qn::tr::anchor_set_lock set(&anchors); // the spool thread looks at it
+        qn::tr::store_relaxed(anchors.spool, nullptr);
     }
 
     client program{"ABCD"};

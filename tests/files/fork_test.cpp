@@ -250,9 +250,13 @@ private:
 
 TEST_F(ForkedChild, FindsEveryComponentWholeThoughOneIsBeingRegistered)
 {
+#ifdef __SANITIZE_THREAD__
+    GTEST_SKIP() << "the child allocates where ThreadSanitizer sees a signal handler";
+#endif
     int forked = 0;
+    int failed = 0;
     {
-        const watched_levels levels([&forked] {
+        const watched_levels levels([&forked, &failed] {
             const pid_t child = fork();
             if (child == 0) {
                 watched_levels::let_all_in();
@@ -263,12 +267,13 @@ TEST_F(ForkedChild, FindsEveryComponentWholeThoughOneIsBeingRegistered)
             }
             int status = -1;
             waitpid(child, &status, 0);
-            EXPECT_EQ(status, 0) << "child " << forked;
+            if (status != 0) ++failed;
             ++forked;
         });
         const tr_category_description_t categories[] = {{0, "First", 1, 1}, {1, "Second", 1, 1}};
         EXPECT_EQ(tr_register_component_1("HALF", watched_levels::levels(), categories, 2), 0);
     }
+    EXPECT_EQ(failed, 0) << "children";
     EXPECT_EQ(forked, 4) << "two levels are set to 0, and to what they begin with";
     EXPECT_EQ(tr_unregister_component_1("HALF"), 0);
 }

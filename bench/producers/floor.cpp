@@ -74,7 +74,10 @@ private:
     template <std::size_t known_bytes>
     [[gnu::noinline]] void copy(std::size_t bytes)
     {
-        if constexpr (known_bytes != 0) bytes = known_bytes;
+        if constexpr (known_bytes != 0)
+            bytes = known_bytes;
+        else
+            asm("" : "+r"(bytes)); // or the compiler sees them after all, and copies by a slow string instruction
         pthread_mutex_lock(&mutex_);
         if (next_ + bytes > size_) next_ = 0;
         unsigned char *place = map_ + next_;

@@ -42,7 +42,6 @@ void compare(size_t size, const char *format, ...)
 {
     std::array<char, 1280> expected{};
     std::array<char, 1280> text{};
-    size_t length = 0;
     va_list args;
     va_start(args, format);
     errno = ENOENT;
@@ -50,7 +49,7 @@ void compare(size_t size, const char *format, ...)
     va_end(args);
     va_start(args, format);
     errno = ENOENT;
-    const int result = qn::tr::format_text(text.data(), size, format, args, length);
+    const auto [result, length] = qn::tr::format_text(text.data(), size, format, args);
     va_end(args);
 
     qn::fuzz::require(result == expected_result, "a result", format);

@@ -78,23 +78,21 @@ struct made {
 made make(const char *format, ...)
 {
     char buffer[256] = "";
-    size_t length = 0;
     va_list args;
     va_start(args, format);
-    const int result = qn::tr::format_text(buffer, sizeof buffer, format, args, length);
+    const int result = qn::tr::format_text(buffer, sizeof buffer, format, args).result;
     va_end(args);
     return {buffer, result};
 }
 
 int make_nothing(const char *format, ...)
 {
-    size_t length = 4711;
     va_list args;
     va_start(args, format);
-    const int result = qn::tr::format_text(nullptr, 0, format, args, length);
+    const qn::tr::made_text text = qn::tr::format_text(nullptr, 0, format, args);
     va_end(args);
-    EXPECT_EQ(length, 4711U);
-    return result;
+    EXPECT_EQ(text.length, 0U);
+    return text.result;
 }
 #pragma GCC diagnostic pop
 } // namespace
@@ -336,11 +334,10 @@ TEST(FormatText, MeasuresATextWithoutABuffer)
 TEST(FormatText, TakesABufferThatIsSaidToBeEndless)
 {
     char buffer[64];
-    size_t length = 0;
     const auto make_endless = [&](const char *format, ...) {
         va_list args;
         va_start(args, format);
-        const int result = qn::tr::format_text(buffer, INT_MAX, format, args, length);
+        const int result = qn::tr::format_text(buffer, INT_MAX, format, args).result;
         va_end(args);
         return result;
     };

@@ -201,6 +201,31 @@ TEST(DataWriter, WritesOnlyTheFixedPartWhenTheFirstBlockIsTooLong)
     expect_record(trace.only_record(), data_blocks, "COMP", expected_bytes().u32(7).u32(0));
 }
 
+TEST(DataWriter, WritesOnlyTheFixedPartWhenTheFirstOfSeveralBlocksIsTooLong)
+{
+    const one_trace trace(small_file);
+    const std::string huge(longest, 'x');
+    EXPECT_EQ(tr_record_data_1("COMP", 7, 2, huge.data(), static_cast<int>(huge.size()), "y", 1), 0);
+    expect_record(trace.only_record(), data_blocks, "COMP", expected_bytes().u32(7).u32(0));
+}
+
+TEST(DataWriter, TakesTheLongestBlockThatFits)
+{
+    const one_trace trace(small_file);
+    const std::string block(longest - 40, 'x');
+    EXPECT_EQ(tr_record_data_1("COMP", 7, 1, block.data(), static_cast<int>(block.size())), 0);
+    expect_record(trace.only_record(), data_blocks, "COMP",
+                  expected_bytes().u32(7).u32(1).u32(static_cast<uint32_t>(block.size())).raw(block));
+}
+
+TEST(DataWriter, LeavesOutABlockOfAByteMoreThanFits)
+{
+    const one_trace trace(small_file);
+    const std::string block(longest - 39, 'x');
+    EXPECT_EQ(tr_record_data_1("COMP", 7, 1, block.data(), static_cast<int>(block.size())), 0);
+    expect_record(trace.only_record(), data_blocks, "COMP", expected_bytes().u32(7).u32(0));
+}
+
 TEST(DataWriter, ChecksTheBlocksOfATraceThatIsNotActive)
 {
     const one_trace trace;

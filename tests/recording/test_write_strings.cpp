@@ -1,4 +1,7 @@
 // Strings records: counts, cuts and refusals.
+#include <chrono>
+#include <thread>
+
 #include <gtest/gtest.h>
 
 #include "recording/expected_bytes.h"
@@ -7,6 +10,7 @@
 #include "trace/trace.h"
 
 using namespace qn::test;
+using qn::tr::store_relaxed;
 
 namespace
 {
@@ -139,6 +143,22 @@ TEST(StringsWriter, WritesOnlyTheFixedPartWhenTheFirstStringIsTooLong)
     expect_record(trace.only_record(), strings, "COMP", expected_bytes().u32(7).u32(0).u32(0));
 }
 
+TEST(StringsWriter, WritesOnlyTheFixedPartWhenTheFirstOfSeveralStringsIsTooLong)
+{
+    const one_trace trace(small_file);
+    const std::string huge(longest, 'x');
+    EXPECT_EQ(tr_record_strings_1("COMP", 7, 2, huge.c_str(), "second"), 0);
+    expect_record(trace.only_record(), strings, "COMP", expected_bytes().u32(7).u32(0).u32(0));
+}
+
+TEST(StringsWriter, WritesOnlyTheFixedPartWhenTheOnlyStringIsTooLong)
+{
+    const one_trace trace(small_file);
+    const std::string huge(longest, 'x');
+    EXPECT_EQ(tr_record_string_1("COMP", huge.c_str()), 0);
+    expect_record(trace.only_record(), strings, "COMP", expected_bytes().u32(0xFFFFFFFF).u32(0).u32(0));
+}
+
 TEST(StringsWriter, WritesARecordOfTheLongestLength)
 {
     const one_trace trace(small_file);
@@ -153,5 +173,23 @@ TEST(StringsWriter, LosesARecordWhoseStringsFitButNotWithTheFixedPart)
     const one_trace trace(small_file);
     const std::string text(longest - 40, 'x');
     EXPECT_EQ(tr_record_string_1("COMP", text.c_str()), 0);
+    EXPECT_EQ(tr_record_strings_1("COMP", 7, 2, "y", text.c_str() + 2), 0);
     EXPECT_TRUE(trace.written().empty());
+}
+
+// The strings are measured before the lock is there. A trace that is started meanwhile is not to get a record of none.
+TEST(StringsWriter, WritesNothingIntoATraceThatIsStartedWhileItWaits)
+{
+    const one_trace trace;
+    ASSERT_EQ(lock_anchor_set(&anchors), 0);
+    const qn_uint32_t active = anchors.uMaxSize;
+    store_relaxed(anchors.uMaxSize, 0);
+    std::thread one([] { EXPECT_EQ(tr_record_strings_1("COMP", 7, 1, "a"), 0); });
+    std::thread two([] { EXPECT_EQ(tr_record_strings_1("COMP", 7, 2, "a", "b"), 0); });
+    std::this_thread::sleep_for(std::chrono::milliseconds(50)); // for both to look
+    store_relaxed(anchors.uMaxSize, active);
+    EXPECT_EQ(unlock_anchor_set(&anchors), 0);
+    one.join();
+    two.join();
+    for (const record_image &record : trace.written()) EXPECT_NE(record.u32(32), 0U); // who looked late
 }

@@ -193,8 +193,11 @@ inline int lock_briefly_held(pthread_mutex_t *mutex)
                                                              lock_rank rank, int &result)
 {
     expect_in_order(mutex, rank);
-    result = lock_briefly_held(mutex);
-    if (__builtin_expect(result != 0, 0)) return nullptr;
+    const int taken = lock_briefly_held(mutex);
+    if (__builtin_expect(taken != 0, 0)) {
+        result = taken;
+        return nullptr;
+    }
     note_taken(mutex, rank);
     if (__builtin_expect(mutex == anchor_set_mutex(anchor), 1)) return mutex;
     unlock_mutex(mutex);

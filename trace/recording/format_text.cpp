@@ -3,7 +3,6 @@
 // nothing but the buffer has changed.
 #include "trace/recording/format_text.h"
 
-#include <algorithm>
 #include <bit>
 #include <climits>
 #include <cstdint>
@@ -15,8 +14,8 @@ namespace
 static_assert(sizeof(long) == 8 && sizeof(size_t) == 8 && sizeof(intmax_t) == 8 && sizeof(ptrdiff_t) == 8,
               "l, ll, z, j and t say one and the same");
 
-constexpr int longest_number = 22;        // 64 bits in octal
 constexpr size_t longest_short_text = 16; // what a loop copies in less time than calls of the C library take
+constexpr size_t longest_number = 22;     // 64 bits in octal
 
 constexpr const char *lower_case = "0123456789abcdef";
 constexpr const char *upper_case = "0123456789ABCDEF";
@@ -26,28 +25,38 @@ constexpr const char *digit_pairs = "0001020304050607080910111213141516171819202
                                     "40414243444546474849505152535455565758596061626364656667686970717273747576777879"
                                     "8081828384858687888990919293949596979899";
 
-size_t digits_of(uint64_t value)
-{
-    for (size_t digits = 1;; digits += 4, value /= 10000) {
-        if (value < 10) return digits;
-        if (value < 100) return digits + 1;
-        if (value < 1000) return digits + 2;
-        if (value < 10000) return digits + 3;
-    }
-}
-
 // The functions that put something return the end of it.
 
-char *put_decimal(char *to, uint64_t value)
+char *put_digit_pair(char *to, uint64_t value)
 {
-    char *const end = to + digits_of(value);
-    char *place = end;
-    for (; value > 99; value /= 100) std::memcpy(place -= 2, digit_pairs + value % 100 * 2, 2);
-    if (value > 9)
-        std::memcpy(to, digit_pairs + value * 2, 2);
-    else
-        *to = static_cast<char>('0' + value);
-    return end;
+    std::memcpy(to, digit_pairs + value * 2, 2);
+    return to + 2;
+}
+
+char *put_below_100(char *to, uint64_t value)
+{
+    if (value > 9) return put_digit_pair(to, value);
+    *to = static_cast<char>('0' + value);
+    return to + 1;
+}
+
+[[gnu::noinline]] char *put_four_digits_more(char *to, uint64_t value);
+
+[[gnu::noinline]] char *put_decimal(char *to, uint64_t value)
+{
+    if (value < 100) return put_below_100(to, value);
+    if (value < 10000) {
+        const auto few = static_cast<unsigned>(value);
+        return put_digit_pair(put_below_100(to, few / 100), few % 100);
+    }
+    return put_four_digits_more(to, value);
+}
+
+char *put_four_digits_more(char *to, uint64_t value)
+{
+    to = put_decimal(to, value / 10000);
+    const auto last = static_cast<unsigned>(value % 10000);
+    return put_digit_pair(put_digit_pair(to, last / 100), last % 100);
 }
 
 char *put_signed(char *to, int64_t value)
@@ -134,7 +143,7 @@ char *pad(char *from, char *end, const field &as)
 
 // Puts a field, of which `format` is what stands behind the %, and moves `format` behind the conversion. Null: it is for
 // vsnprintf().
-[[gnu::noinline]] char *put_field(char *to, const char *limit, const char *&format, argument_reader &arguments)
+char *put_field(char *to, const char *limit, const char *&format, argument_reader &arguments)
 {
     field as;
     format = read_field(format, static_cast<size_t>(limit - to), as);
@@ -168,19 +177,41 @@ char *pad(char *from, char *end, const field &as)
     return static_cast<size_t>(end - to) < as.width ? pad(to, end, as) : end;
 }
 
+// Puts a conversion, of which `format` is what stands behind the %, and moves `format` behind it. Null: it is for
+// vsnprintf(). Some come as they are here, without flags and width.
+[[gnu::noinline]] char *put_conversion(char *to, const char *limit, const char *&format, argument_reader &arguments)
+{
+    if (format[0] == '%') {
+        *to++ = '%';
+        ++format;
+    } else if (format[0] == 'x') {
+        to = put_bits(to, va_arg(arguments.list, unsigned), 4, lower_case);
+        ++format;
+    } else if (format[0] == 'l' && format[1] == 'd') {
+        to = put_signed(to, va_arg(arguments.list, long));
+        format += 2;
+    } else if (format[0] == 'l' && format[1] == 'u') {
+        to = put_decimal(to, va_arg(arguments.list, unsigned long));
+        format += 2;
+    } else {
+        to = put_field(to, limit, format, arguments);
+    }
+    return to;
+}
+
 // Puts the text and its terminator, which stands at `limit` at the latest. Returns the terminator's place; null: the
 // format, or so long a text, is for vsnprintf(). A text made here has no NUL inside.
 inline char *put_text(char *to, char *limit, const char *format, argument_reader &arguments)
 {
-    for (;;) {
-        const size_t room = static_cast<size_t>(limit - to);
-        const size_t few = std::min(room, longest_short_text);
+    // Where a short literal text and a number still fit. Others see to their room.
+    const char *const last = limit - longest_short_text - longest_number;
+    while (to <= last) {
         size_t length = 0;
-        char c = '\0';
+        char c = 0;
         while ((c = format[length]) != '%' && c != '\0') {
-            if (length == few) [[unlikely]] {
+            if (length == longest_short_text) [[unlikely]] {
                 length = static_cast<size_t>(strchrnul(format, '%') - format);
-                if (length > room) return nullptr;
+                if (length > static_cast<size_t>(limit - longest_number - to)) return nullptr;
                 std::memcpy(to, format, length);
                 c = format[length];
                 break;
@@ -188,42 +219,32 @@ inline char *put_text(char *to, char *limit, const char *format, argument_reader
             to[length++] = c;
         }
         to += length;
-        if (c == '\0') break;
-        format += length + 1;
-        if (limit - to < longest_number) return nullptr;
-        switch (*format++) {
-        case '%': *to++ = '%'; break;
-        case 'd':
-        case 'i': to = put_signed(to, va_arg(arguments.list, int)); break;
-        case 'u': to = put_decimal(to, va_arg(arguments.list, unsigned)); break;
-        case 'x': to = put_bits(to, va_arg(arguments.list, unsigned), 4, lower_case); break;
-        case 's': {
+        format += length;
+        if (c == '\0') {
+            *to = '\0';
+            return to;
+        }
+        const char conversion = format[1];
+        if (conversion == 'd') [[likely]] {
+            to = put_signed(to, va_arg(arguments.list, int));
+            format += 2;
+        } else if (conversion == 's') {
             const char *string = va_arg(arguments.list, const char *);
             if (string == nullptr) return nullptr;
             to = put_string(to, limit, string);
             if (to == nullptr) return nullptr;
-            break;
-        }
-        case 'l':
-        case 'z':
-            if (*format == 'd') {
-                ++format;
-                to = put_signed(to, va_arg(arguments.list, long));
-                break;
-            }
-            if (*format == 'u') {
-                ++format;
-                to = put_decimal(to, va_arg(arguments.list, unsigned long));
-                break;
-            }
-            [[fallthrough]];
-        default:
-            to = put_field(to, limit, --format, arguments);
+            format += 2;
+        } else if (conversion == 'u') {
+            to = put_decimal(to, va_arg(arguments.list, unsigned));
+            format += 2;
+        } else {
+            const char *behind = format + 1; // so that the address of `format` is not taken
+            to = put_conversion(to, limit, behind, arguments);
             if (to == nullptr) return nullptr;
+            format = behind;
         }
     }
-    *to = '\0';
-    return to;
+    return nullptr;
 }
 } // namespace
 
@@ -231,21 +252,17 @@ namespace qn::tr
 {
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral" // the exported calls check the client's format
-int format_text(char *to, size_t size, const char *format, va_list args, size_t &length)
+made_text format_text(char *to, size_t size, const char *format, va_list args)
 {
-    if (size != 0) {
+    if (size > longest_short_text + longest_number && size <= INT_MAX) {
         argument_reader copy;
         va_copy(copy.list, args);
-        const char *const end = put_text(to, to + std::min<size_t>(size, INT_MAX) - 1, format, copy);
+        const char *const end = put_text(to, to + size - 1, format, copy);
         va_end(copy.list);
-        if (end != nullptr) {
-            length = static_cast<size_t>(end - to);
-            return static_cast<int>(length);
-        }
+        if (end != nullptr) return {static_cast<int>(end - to), static_cast<size_t>(end - to)};
     }
     const int result = std::vsnprintf(to, size, format, args);
-    if (result >= 0 && size != 0) length = std::strlen(to);
-    return result;
+    return {result, result >= 0 && size != 0 ? std::strlen(to) : 0};
 }
 #pragma GCC diagnostic pop
 } // namespace qn::tr

@@ -6,8 +6,13 @@
 
 namespace qn::tr
 {
-// Does to `to` what vsnprintf() does, to the byte and for every format, and returns what it returns. `length` becomes
-// the length of the text in `to`, as strlen() finds it: less than what is returned when the text is cut, or when %c
-// brings a NUL. Without a text (a negative result, or size 0) it is left alone.
-int format_text(char *to, size_t size, const char *format, va_list args, size_t &length);
+struct made_text {
+    int result; // vsnprintf()'s
+    size_t
+        length; // of the text in the buffer, as strlen() finds it: less than the result when the text is cut, or when
+                // %c brings a NUL; 0 without a text, when the result is negative or the buffer has no bytes
+};
+
+// Does to `to` what vsnprintf() does, to the byte and for every format.
+made_text format_text(char *to, size_t size, const char *format, va_list args);
 } // namespace qn::tr

@@ -12,6 +12,21 @@ using namespace qn::tr;
 constexpr qn_int32_t most_blocks = 128;
 constexpr qn_uint32_t longest_block = 0x100000;
 
+// What is wrong with a block; 0: nothing.
+qn_int32_t check_block(const void *block, qn_uint32_t length)
+{
+    if (block == nullptr) return QN_TR_EBLOCKPTR;
+    return length > longest_block ? QN_TR_EBLOCKLEN : 0;
+}
+
+// Returns where the next block goes.
+unsigned char *put_block(unsigned char *place, const void *block, qn_uint32_t length)
+{
+    std::memcpy(place, &length, sizeof length);
+    std::memcpy(place + sizeof length, block, length);
+    return place + format::block_bytes(length);
+}
+
 struct data_writer : record_writer {
     static constexpr auto function = format::kind::data_blocks;
     using record = trace_record_data_t;
@@ -36,8 +51,8 @@ struct data_writer : record_writer {
         for (qn_int32_t i = 0; i < n_blocks; ++i) {
             const void *block = va_arg(arguments, const void *);
             const auto length = static_cast<qn_uint32_t>(va_arg(arguments, int));
-            if (block == nullptr) return QN_TR_EBLOCKPTR;
-            if (length > longest_block) return QN_TR_EBLOCKLEN;
+            const qn_int32_t status = check_block(block, length);
+            if (status != 0) return status;
             if (record_bytes + format::block_bytes(length) > anchor->uMaxSize) {
                 n_blocks = i;
                 break;
@@ -60,11 +75,43 @@ struct data_writer : record_writer {
         to->trace_id = trace_id;
         to->n_blocks = static_cast<qn_uint32_t>(n_blocks);
         unsigned char *place = body_of(to);
-        for (qn_int32_t i = 0; i < n_blocks; ++i) {
-            std::memcpy(place, &lengths[i], sizeof lengths[i]);
-            std::memcpy(place + sizeof lengths[i], blocks[i], lengths[i]);
-            place += format::block_bytes(lengths[i]);
+        for (qn_int32_t i = 0; i < n_blocks; ++i) place = put_block(place, blocks[i], lengths[i]);
+    }
+};
+
+// One block, which is what most data records have: without a list of blocks, they cost a tenth less.
+struct block_writer : record_writer {
+    static constexpr auto function = format::kind::data_blocks;
+    using record = trace_record_data_t;
+
+    qn_uint32_t trace_id;
+    const void *block;
+    qn_uint32_t block_length;
+    qn_uint32_t n_blocks = 1;
+
+    block_writer(qn_uint32_t id, const void *only, int length)
+        : trace_id(id), block(only), block_length(static_cast<qn_uint32_t>(length))
+    {
+    }
+
+    qn_int32_t check_locked(const trace_anchor_t *) const { return check_block(block, block_length); }
+
+    // A block that is too long is left out.
+    qn_int32_t size(const trace_anchor_t *anchor, unsigned int &length)
+    {
+        length = static_cast<unsigned int>(sizeof(record)) + format::block_bytes(block_length);
+        if (length > anchor->uMaxSize) {
+            length = sizeof(record);
+            n_blocks = 0;
         }
+        return 0;
+    }
+
+    void fill(trace_record_data_t *to) const
+    {
+        to->trace_id = trace_id;
+        to->n_blocks = n_blocks;
+        if (n_blocks != 0) put_block(body_of(to), block, block_length);
     }
 };
 } // namespace
@@ -107,9 +154,13 @@ qn_int32_t tr_record_data_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_ui
 {
     va_list args;
     va_start(args, blkCount);
-    const qn_int32_t status = __builtin_expect(data_are_own, 1)
-                                  ? write_record_by<data_writer>(pCompId, nullptr, traceId, blkCount, args)
-                                  : tr_record_data_v_1(pCompId, traceId, blkCount, args);
+    qn_int32_t status = 0;
+    if (__builtin_expect(data_are_own && blkCount == 1, 1)) {
+        const void *block = va_arg(args, const void *);
+        status = write_record_by<block_writer>(pCompId, nullptr, traceId, block, va_arg(args, int));
+    } else {
+        status = tr_record_data_v_1(pCompId, traceId, blkCount, args);
+    }
     va_end(args);
     return status;
 }

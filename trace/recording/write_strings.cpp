@@ -1,18 +1,15 @@
-// Strings records: up to 32 strings, or one formatted text.
-#include <algorithm>
+// Strings records: up to 32 strings.
 #include <array>
 #include <cstdarg>
 #include <cstring>
 
-#include "trace/recording/format_text.h"
-#include "trace/recording/record_frame.h"
+#include "trace/recording/string_writer.h"
 
 namespace
 {
 using namespace qn::tr;
 
 constexpr qn_uint32_t most_strings = 32;
-constexpr qn_uint32_t no_trace_id = 0xFFFFFFFF;
 
 struct strings_writer : record_writer {
     static constexpr auto function = format::kind::strings;
@@ -41,6 +38,7 @@ struct strings_writer : record_writer {
             if (string == nullptr || string[0] == '\0') return QN_TR_ESTRING;
             const size_t size = std::strlen(string) + 1;
             if (len_strings + size > longest) {
+                if (longest == 0) return nothing_to_write; // not active: what is started meanwhile gets no empty record
                 number = i;
                 break;
             }
@@ -66,57 +64,13 @@ struct strings_writer : record_writer {
         for (qn_uint32_t i = 0; i < number; place += sizes[i++]) std::memcpy(place, strings[i], sizes[i]);
     }
 };
-
-// The text is made in the anchor's buffer, under the lock.
-struct formatted_writer : record_writer {
-    static constexpr auto function = format::kind::strings;
-    using record = trace_record_strings_t;
-
-    qn_uint32_t id;
-    const char *format;
-    argument_list arguments;
-    const char *text = nullptr;
-    qn_uint32_t text_size = 0; // with its terminator
-
-    formatted_writer(qn_uint32_t trace_id, const char *text_format, argument_list args)
-        : id(trace_id), format(text_format), arguments(args)
-    {
-    }
-
-    qn_int32_t check(const trace_anchor_t *) const
-    {
-        return format == nullptr || format[0] == '\0' ? QN_TR_ENOFORMAT : 0;
-    }
-
-    qn_int32_t size(trace_anchor_t *anchor, unsigned int &length)
-    {
-        if (anchor->uMaxSize == sizeof(record)) return nothing_to_write; // no room for a terminator
-        size_t characters = 0;
-        if (format_text(anchor->buffer, sizeof anchor->buffer, format, arguments, characters) < 0) return QN_TR_EFORMAT;
-        text = anchor->buffer;
-        text_size = static_cast<qn_uint32_t>(characters) + 1;
-        length = format::strings_record_bytes(text_size);
-        if (length > anchor->uMaxSize) {
-            length = anchor->uMaxSize;
-            text_size = anchor->uMaxSize - static_cast<qn_uint32_t>(sizeof(record));
-        }
-        return 0;
-    }
-
-    void fill(trace_record_strings_t *to) const
-    {
-        to->id = id;
-        to->number = 1;
-        to->len_strings = text_size;
-        std::memcpy(body_of(to), text, text_size - 1);
-        body_of(to)[text_size - 1] = '\0';
-    }
-};
 } // namespace
 
 // The forms forward to the main writer through the exported names, so that an application that replaces one of those
 // changes these too. Nearly always nobody has: then the calls through the table of imported names are left out.
 extern "C" {
+[[gnu::visibility("hidden"), gnu::alias("tr_record_strings_1")]] qn_int32_t own_strings(const qn_char_t *, qn_uint32_t,
+                                                                                        qn_uint32_t, ...);
 [[gnu::visibility("hidden"), gnu::alias("tr_record_strings_v_1")]] qn_int32_t
 own_strings_v(const qn_char_t *, qn_uint32_t, qn_uint32_t, va_list);
 [[gnu::visibility("hidden"), gnu::alias("tr_ms_record_strings_v_1")]] qn_int32_t
@@ -126,7 +80,8 @@ own_ms_strings_v(const qn_char_t *, qn_uint32_t, tr_file_token_t, qn_uint32_t, v
 namespace
 {
 // Known when the library is loaded: all its names are bound then.
-const bool strings_are_own = tr_record_strings_v_1 == own_strings_v && tr_ms_record_strings_v_1 == own_ms_strings_v;
+const bool lists_are_own = tr_record_strings_v_1 == own_strings_v && tr_ms_record_strings_v_1 == own_ms_strings_v;
+const bool strings_are_own = lists_are_own && tr_record_strings_1 == own_strings;
 } // namespace
 
 qn_int32_t tr_ms_record_strings_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
@@ -154,59 +109,16 @@ qn_int32_t tr_record_strings_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn
 {
     va_list args;
     va_start(args, numStrings);
-    const qn_int32_t status = __builtin_expect(strings_are_own, 1)
-                                  ? write_record_by<strings_writer>(pCompId, nullptr, traceId, numStrings, args)
-                                  : tr_record_strings_v_1(pCompId, traceId, numStrings, args);
+    const qn_int32_t status =
+        __builtin_expect(lists_are_own && numStrings == 1, 1)
+            ? write_record_by<string_writer>(pCompId, nullptr, traceId, va_arg(args, const char *))
+            : tr_record_strings_v_1(pCompId, traceId, numStrings, args);
     va_end(args);
     return status;
 }
 
 qn_int32_t tr_record_string_1(const qn_char_t *pCompId, const qn_char_t *pString)
 {
-    return tr_record_strings_1(pCompId, no_trace_id, 1, pString);
-}
-
-qn_int32_t tr_ms_record_vfmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
-                                      const qn_char_t *pFormat, va_list args)
-{
-    return write_record_by<formatted_writer>(pCompId, fileToken, traceId, pFormat, args);
-}
-
-qn_int32_t tr_record_vfmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat,
-                                   va_list args)
-{
-    return tr_ms_record_vfmt_string_1(pCompId, traceId, nullptr, pFormat, args);
-}
-
-qn_int32_t tr_ms_record_fmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
-                                     const qn_char_t *pFormat, ...)
-{
-    va_list args;
-    va_start(args, pFormat);
-    const qn_int32_t status = tr_ms_record_vfmt_string_1(pCompId, traceId, fileToken, pFormat, args);
-    va_end(args);
-    return status;
-}
-
-qn_int32_t tr_record_fmt_string_1(const qn_char_t *pCompId, qn_uint32_t traceId, const qn_char_t *pFormat, ...)
-{
-    va_list args;
-    va_start(args, pFormat);
-    const qn_int32_t status = tr_record_vfmt_string_1(pCompId, traceId, pFormat, args);
-    va_end(args);
-    return status;
-}
-
-qn_int32_t tr_record_vprintf_1(const qn_char_t *pCompId, const qn_char_t *pFormat, va_list args)
-{
-    return tr_record_vfmt_string_1(pCompId, no_trace_id, pFormat, args);
-}
-
-qn_int32_t tr_record_printf_1(const qn_char_t *pCompId, const qn_char_t *pFormat, ...)
-{
-    va_list args;
-    va_start(args, pFormat);
-    const qn_int32_t status = tr_record_vfmt_string_1(pCompId, no_trace_id, pFormat, args);
-    va_end(args);
-    return status;
+    if (__builtin_expect(!strings_are_own, 0)) return tr_record_strings_1(pCompId, no_trace_id, 1, pString);
+    return write_record_by<string_writer>(pCompId, nullptr, no_trace_id, pString);
 }

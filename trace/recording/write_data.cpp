@@ -89,8 +89,8 @@ struct block_writer : record_writer {
     qn_uint32_t block_length;
     qn_uint32_t n_blocks = 1;
 
-    block_writer(qn_uint32_t id, const void *only, int length)
-        : trace_id(id), block(only), block_length(static_cast<qn_uint32_t>(length))
+    block_writer(qn_uint32_t id, argument_list args)
+        : trace_id(id), block(va_arg(args, const void *)), block_length(static_cast<qn_uint32_t>(va_arg(args, int)))
     {
     }
 
@@ -126,7 +126,8 @@ own_ms_data_v(const qn_char_t *, qn_uint32_t, tr_file_token_t, qn_uint32_t, va_l
 
 namespace
 {
-const bool data_are_own = tr_record_data_v_1 == own_data_v && tr_ms_record_data_v_1 == own_ms_data_v;
+const bool ms_data_are_own = tr_ms_record_data_v_1 == own_ms_data_v;
+const bool data_are_own = ms_data_are_own && tr_record_data_v_1 == own_data_v;
 } // namespace
 
 qn_int32_t tr_ms_record_data_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
@@ -145,7 +146,9 @@ qn_int32_t tr_ms_record_data_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr
 {
     va_list args;
     va_start(args, blkCount);
-    const qn_int32_t status = tr_ms_record_data_v_1(pCompId, traceId, fileToken, blkCount, args);
+    const qn_int32_t status = __builtin_expect(ms_data_are_own && blkCount == 1, 1)
+                                  ? write_record_by<block_writer>(pCompId, fileToken, traceId, args)
+                                  : tr_ms_record_data_v_1(pCompId, traceId, fileToken, blkCount, args);
     va_end(args);
     return status;
 }
@@ -154,13 +157,9 @@ qn_int32_t tr_record_data_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_ui
 {
     va_list args;
     va_start(args, blkCount);
-    qn_int32_t status = 0;
-    if (__builtin_expect(data_are_own && blkCount == 1, 1)) {
-        const void *block = va_arg(args, const void *);
-        status = write_record_by<block_writer>(pCompId, nullptr, traceId, block, va_arg(args, int));
-    } else {
-        status = tr_record_data_v_1(pCompId, traceId, blkCount, args);
-    }
+    const qn_int32_t status = __builtin_expect(data_are_own && blkCount == 1, 1)
+                                  ? write_record_by<block_writer>(pCompId, nullptr, traceId, args)
+                                  : tr_record_data_v_1(pCompId, traceId, blkCount, args);
     va_end(args);
     return status;
 }

@@ -55,8 +55,8 @@ own_ms_vfmt_string(const qn_char_t *, qn_uint32_t, tr_file_token_t, const qn_cha
 
 namespace
 {
-const bool formatted_are_own =
-    tr_record_vfmt_string_1 == own_vfmt_string && tr_ms_record_vfmt_string_1 == own_ms_vfmt_string;
+const bool ms_formatted_are_own = tr_ms_record_vfmt_string_1 == own_ms_vfmt_string;
+const bool formatted_are_own = ms_formatted_are_own && tr_record_vfmt_string_1 == own_vfmt_string;
 
 [[gnu::always_inline]] inline qn_int32_t record_formatted(const qn_char_t *comp_id, qn_uint32_t trace_id,
                                                           const char *format, va_list args)
@@ -84,7 +84,9 @@ qn_int32_t tr_ms_record_fmt_string_1(const qn_char_t *pCompId, qn_uint32_t trace
 {
     va_list args;
     va_start(args, pFormat);
-    const qn_int32_t status = tr_ms_record_vfmt_string_1(pCompId, traceId, fileToken, pFormat, args);
+    const qn_int32_t status = __builtin_expect(ms_formatted_are_own, 1)
+                                  ? write_record_by<formatted_writer>(pCompId, fileToken, traceId, pFormat, args)
+                                  : tr_ms_record_vfmt_string_1(pCompId, traceId, fileToken, pFormat, args);
     va_end(args);
     return status;
 }

@@ -80,7 +80,8 @@ own_ms_strings_v(const qn_char_t *, qn_uint32_t, tr_file_token_t, qn_uint32_t, v
 namespace
 {
 // Known when the library is loaded: all its names are bound then.
-const bool lists_are_own = tr_record_strings_v_1 == own_strings_v && tr_ms_record_strings_v_1 == own_ms_strings_v;
+const bool ms_lists_are_own = tr_ms_record_strings_v_1 == own_ms_strings_v;
+const bool lists_are_own = ms_lists_are_own && tr_record_strings_v_1 == own_strings_v;
 const bool strings_are_own = lists_are_own && tr_record_strings_1 == own_strings;
 } // namespace
 
@@ -100,7 +101,10 @@ qn_int32_t tr_ms_record_strings_1(const qn_char_t *pCompId, qn_uint32_t traceId,
 {
     va_list args;
     va_start(args, numStrings);
-    const qn_int32_t status = tr_ms_record_strings_v_1(pCompId, traceId, fileToken, numStrings, args);
+    const qn_int32_t status =
+        __builtin_expect(ms_lists_are_own && numStrings == 1, 1)
+            ? write_record_by<string_writer>(pCompId, fileToken, traceId, va_arg(args, const char *))
+            : tr_ms_record_strings_v_1(pCompId, traceId, fileToken, numStrings, args);
     va_end(args);
     return status;
 }

@@ -40,6 +40,13 @@ void expect_fresh(const one_trace &trace)
     EXPECT_EQ(ring[1].sequence(), 2U);
 }
 
+// Puts other sizes beside the trace's file, less than a memory page.
+void pretend_sizes(uint32_t requested, uint32_t actual)
+{
+    anchors.uRequestedFileSize = requested;
+    anchors.uActualFileSize = actual;
+}
+
 // Asks for a record on a ring that cannot give one, and expects the complaint and a fresh file.
 void expect_given_up(const one_trace &trace, uint32_t length, const std::string &complaint)
 {
@@ -178,19 +185,47 @@ TEST(DamagedRing, IsUsedWhenAHeaderJustFitsBeforeTheEnd)
     EXPECT_EQ(record.length, 100U);
 }
 
-TEST(AllocationLoop, LooksAtOneRecordFor28BytesOfTheRequestedSizeAndOneMore)
+TEST(AllocationLoop, LooksAtOneRecordFor28BytesOfTheFileAndOneMore)
 {
     const one_trace trace(small_file);
     lay_out({{32}, {32}, {32}, {32}, {32}, {3736}}, 0);
-    anchors.uRequestedFileSize = 28 * 3;
+    pretend_sizes(28, 28 * 3);
     EXPECT_EQ(allocate(100).length, 128U); // four records
+}
+
+TEST(AllocationLoop, GoesByTheRequestedSizeOfAFileThatGotLess)
+{
+    const one_trace trace(small_file);
+    lay_out({{32}, {32}, {32}, {32}, {32}, {3736}}, 0);
+    pretend_sizes(28 * 3, 28);
+    EXPECT_EQ(allocate(100).length, 128U);
+}
+
+// A file that exists keeps its size, however little is requested later.
+TEST(AllocationLoop, LetsARecordTakeThePlaceOfAnyNumberInAFileLargerThanRequested)
+{
+    const one_trace trace(small_file);
+    const tr_file_token_t token = start_another(trace.folder() / "other.trc", 65536);
+    EXPECT_EQ(qn::tr::stop_trace_locked(token), 0);
+    token->uRequestedFileSize = small_file;
+    EXPECT_EQ(qn::tr::start_trace_locked(token), 0);
+    ASSERT_EQ(token->uActualFileSize, 65536U);
+    for (qn_uint32_t id = 1; id <= 3000; ++id) ASSERT_EQ(tr_ms_record_id_1("TEST", id, token), 0);
+
+    const std::vector<char> block(16 * small_file / 4); // over 500 records, and no more than 147 fit into small_file
+    const std::string said = standard_error_of(
+        [&] { EXPECT_EQ(tr_ms_record_data_1("TEST", 1, token, 1, block.data(), static_cast<int>(block.size())), 0); });
+    EXPECT_EQ(said, "");
+    const auto records = trace_image::of_file(trace.folder() / "other.trc").records();
+    EXPECT_GT(records.size(), 1000U);
+    EXPECT_EQ(records.back().function(), 3);
 }
 
 TEST(AllocationLoop, EndsWhenARequestTakesMoreRecords)
 {
     const one_trace trace(small_file);
     lay_out({{32}, {32}, {32}, {32}, {32}, {3736}}, 0);
-    anchors.uRequestedFileSize = 28 * 3;
+    pretend_sizes(28, 28 * 3);
     bool given = true;
     const std::string said = standard_error_of([&] { given = allocate(104).given; });
     EXPECT_FALSE(given);

@@ -8,6 +8,7 @@
 //
 // At every instant the records tile the ring, so that a process killed between any two stores leaves a ring that can be
 // continued. The last part, and a short way for the usual case, are in space.h.
+#include <algorithm>
 #include <cstdio>
 
 #include "trace/files/debug.h"
@@ -193,7 +194,9 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
     const trace_record_header_t *start = nullptr; // the last start record among those consumed
     qn_uint64_t consumed = 0;
     bool wrapped = false;
-    for (qn_int64_t budget = pAnchor->uRequestedFileSize;; budget -= record_header_bytes) {
+    // A file may be larger than what was requested, and a sound ring of it may hold as many more records.
+    const qn_int64_t most_bytes = std::max(pAnchor->uRequestedFileSize, pAnchor->uActualFileSize);
+    for (qn_int64_t budget = most_bytes;; budget -= record_header_bytes) {
         if (__builtin_expect(budget < 0, 0)) return give_up_looping(pAnchor, requested);
         if (__builtin_expect(is_held(header, next), 0)) wait_tail(pAnchor, next->seqNumber);
         if (__builtin_expect(next->function == start_kind, 0)) start = next;

@@ -202,6 +202,28 @@ TEST(PageSet, IsFullBehindARecordThatEndsWithThePage)
     EXPECT_EQ(anchors.seqNumber, 1002U);
 }
 
+// Only a reader's request to wait lets a record through that is longer than half a page.
+TEST(PageSet, StaysOnItsPageForARecordThatNoPageCanHold)
+{
+    const one_trace trace(small_file);
+    const page_set pages(2);
+    poke_u32(tail_reader::tail_request, 1);
+    EXPECT_FALSE(allocate(3896 - 27).given);
+    EXPECT_EQ(page_switch.calls, 0);
+}
+
+TEST(PageSet, GoesOnToAPageWithoutANoticeForARecordAsLongAsAPage)
+{
+    const one_trace trace(small_file);
+    EXPECT_EQ(tr_record_id_1("TEST", 1), 0);
+    anchors.pWrap = qn::tr::record_at(&anchors, 252); // behind a notice, in the start record's place
+    const page_set pages(2);
+    poke_u32(tail_reader::tail_request, 1);
+    unsigned int length = 3896 - 28;
+    EXPECT_EQ(allocate_space(&anchors, &length), &next_page_record);
+    EXPECT_EQ(page_switch.calls, 1);
+}
+
 TEST(PageSet, OfOnePageWraps)
 {
     const one_trace trace(small_file);

@@ -13,6 +13,7 @@ namespace
 {
 constexpr uint32_t small_file = 4096; // its longest record has 1948 bytes
 constexpr uint32_t longest = 1948;
+constexpr uint32_t whole_ring = 3896;
 
 bool all_are(const std::vector<unsigned> &values, unsigned value)
 {
@@ -282,6 +283,28 @@ TEST(TailRequest, LetsARecordBeLongerThanTheLongest)
     EXPECT_EQ(sleeps().size(), 20U);
     trace.image().ring();
     EXPECT_FALSE(allocate(longest + 400).given); // the request is gone, and with it the exception
+}
+
+TEST(TailRequest, LetsARecordBeAsLongAsTheRing)
+{
+    const one_trace trace(small_file);
+    tail_reader reader(trace.file());
+    reader.set_u32(tail_reader::tail_request, 1);
+    const allocated record = allocate(whole_ring - 28);
+    EXPECT_EQ(record.offset, 200U);
+    EXPECT_EQ(record.length, whole_ring);
+}
+
+TEST(TailRequest, LetsNoRecordBeLongerThanTheRing)
+{
+    const one_trace trace(small_file);
+    EXPECT_EQ(tr_record_id_1("TEST", 9), 0);
+    tail_reader reader(trace.file());
+    reader.set_u32(tail_reader::tail_request, 1);
+    EXPECT_EQ(standard_error_of([] { EXPECT_FALSE(allocate(whole_ring - 27).given); }), "");
+    EXPECT_EQ(sleeps().size(), 20U);
+    EXPECT_EQ(trace.only_record().u32(28), 9U);
+    EXPECT_TRUE(allocate(32).given);
 }
 
 TEST(TailRequest, HoldsAWriterOfALongRecordUp)

@@ -34,8 +34,15 @@ bool is_multipage(const trace_anchor_t *anchor)
            anchor->ppActivePg != nullptr;
 }
 
-// A record that a whole empty page cannot take, which only a reader's request to wait lets through, would go from page to
-// page for good.
+// The longest span that one record can have: the whole ring, or a whole page that does not begin with a notice.
+qn_uint64_t longest_span(const trace_anchor_t *anchor)
+{
+    trace_record_header_t *first = is_multipage(anchor) ? anchor->pRing : anchor->pWrap;
+    return static_cast<qn_uint64_t>(anchor->pMapEnd - address(first));
+}
+
+// A record that no page has room for behind its notice, which only a reader's request to wait lets through, would go from
+// page to page for good.
 [[gnu::noinline]] trace_record_header_t *go_on_in_next_page(trace_anchor_t *page, unsigned int *requested)
 {
     return page->pNextFree != page->pWrap ? pageFull(page, requested) : nullptr;
@@ -185,6 +192,7 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
     if (__builtin_expect(qn_uint64_t{tail_request} + requested > pAnchor->uMaxSize, 0)) {
         if (tail_request == 0) return nullptr;
         do_coordination(pAnchor);
+        if (needed > longest_span(pAnchor)) return nullptr; // no wait makes room for it
     }
     if (__builtin_expect(requested % 2 != 0, 0)) debug("Odd length requested: %u\n", requested);
 

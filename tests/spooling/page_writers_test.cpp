@@ -83,6 +83,48 @@ TEST_F(PageWriters, FillAPageExactly)
     EXPECT_EQ(ids_of(2), std::vector<uint32_t>{5000});
 }
 
+TEST_F(PageWriters, LeaveAPageThatWasFilledExactlyWhenTheSetIsStartedAgain)
+{
+    write_ids(head, 2038);
+    ASSERT_EQ(tr_ms_record_values_32_1("TEST", 9, head, 1, 4711), 0);
+    stop(head);
+    ASSERT_EQ(start(head), 0);
+    EXPECT_EQ(head->pActivePg, page(2));
+    EXPECT_EQ(state(1), full);
+    ASSERT_EQ(spq.cnt, 1);
+    EXPECT_EQ(spq.pFirst->pAnchor, head);
+    EXPECT_EQ(ids_of(1), from_to(1, 2039));
+    EXPECT_EQ(image_of(1).records_of(16).size(), 1U) << "that of the first start";
+    EXPECT_EQ(image_of(2).records_of(16).size(), 1U);
+}
+
+TEST_F(PageWriters, GoOnInAPageThatHoldsItsNoticeAloneWhenTheSetIsStartedAgain)
+{
+    put_state(2, full);
+    switch_from(1, too_long);
+    ASSERT_EQ(image_of(2).records_of(2).size(), 1U);
+    stop(head);
+    ASSERT_EQ(start(head), 0);
+    EXPECT_EQ(head->pActivePg, page(2));
+    EXPECT_EQ(spq.cnt, 0);
+    EXPECT_EQ(image_of(2).records_of(16).size(), 1U);
+}
+
+// Such a set wraps, as a single file does.
+TEST_F(PageSet, OfOnePageGoesOnAtItsStartWhenItWasFilledExactlyAndIsStartedAgain)
+{
+    ASSERT_EQ(start_set("t", 1, 65536), 0);
+    write_ids(head, 2038);
+    ASSERT_EQ(tr_ms_record_values_32_1("TEST", 9, head, 1, 4711), 0);
+    ASSERT_EQ(head->pNextFree, head->pWrap);
+    stop(head);
+    ASSERT_EQ(start(head), 0);
+    EXPECT_EQ(spq.cnt, 0);
+    EXPECT_EQ(head->pMap[192], 1);
+    EXPECT_EQ(ids_in(head->fileName).size(), 2037U) << "one gave way to the start record, as the first one did";
+    EXPECT_EQ(trace_image::of_file(head->fileName).records_of(12).size(), 1U);
+}
+
 TEST_F(PageWriters, LeaveAPageWhoseRestIsAWordTooShort)
 {
     write_ids(head, 2038);

@@ -6,6 +6,7 @@
 
 #include "trace/files/debug.h"
 #include "trace/files/trace_file.h"
+#include "trace/spooling/spool_types.h"
 
 namespace
 {
@@ -83,7 +84,10 @@ public:
             } else if (record->seqNumber != format::seq_filler) {
                 last_sequence_ = record->seqNumber;
             }
-            if (offset == size_) offset = ring_start_;
+            if (offset == size_) {
+                ends_in_record_ = record->function != static_cast<qn_uint16_t>(format::kind::free_space);
+                offset = ring_start_;
+            }
             if (offset == oldest_) return nullptr;
             if (!has_room_for_record(offset)) return "corruption 3";
         }
@@ -93,6 +97,8 @@ public:
     qn_uint32_t last_sequence() const { return last_sequence_; }
     qn_uint32_t ring_start() const { return ring_start_; }
     qn_uint32_t free_offset() const { return oldest_; }
+    // Whether the newest record ends where the file ends.
+    bool is_filled_exactly() const { return oldest_ == ring_start_ && ends_in_record_; }
 
 private:
     bool has_room_for_record(qn_uint64_t offset) const
@@ -116,7 +122,13 @@ private:
     qn_uint32_t ring_start_;
     qn_uint32_t oldest_;
     qn_uint32_t last_sequence_ = 0;
+    bool ends_in_record_ = false; // the last bytes of the file are not free
 };
+
+bool is_page_of_set(const trace_anchor_t *anchor)
+{
+    return spooling_is_on(anchor) && load_relaxed(anchor->spool->pages) > 1 && anchor->ppActivePg != nullptr;
+}
 
 bool refuse(const trace_anchor_t *anchor, const char *reason)
 {
@@ -140,7 +152,9 @@ bool reuse_ring(trace_anchor_t *anchor, const program_names &names)
 
     anchor->seqNumber = walk.last_sequence();
     anchor->pWrap = anchor->pRing = record_at(anchor, walk.ring_start());
-    anchor->pNextFree = record_at(anchor, walk.free_offset());
+    // A page never wraps: when it is full, its contents stay for the spool thread, and the next record switches pages.
+    const bool is_full = is_page_of_set(anchor) && walk.is_filled_exactly();
+    anchor->pNextFree = record_at(anchor, is_full ? anchor->uActualFileSize : walk.free_offset());
     debug("\ttrace: Re-using existing file.\n");
     return true;
 }

@@ -10,6 +10,7 @@
 #include <ctime>
 #include <sys/syslog.h>
 
+#include "platform/common/descriptors.h"
 #include "trace/files/debug.h"
 #include "trace/files/error_report.h"
 #include "trace/files/locks.h"
@@ -122,18 +123,20 @@ void start_writing(trace_anchor_t *page)
     if (page->consecutiveSpoolNotCopied != 0) write_notice(page);
     page->pNextFree = page->pWrap;
 }
-} // namespace
 
-trace_record_header_t *pageFull(trace_anchor_t *pAnchor, unsigned int *pReqLength)
+// Queues the full page and makes another one of its set the active one; null when there is none to be had. Each line that
+// is logged on the way would be a place where the thread may be cancelled, with the set half switched.
+trace_anchor_t *switch_pages(trace_anchor_t *full)
 {
-    store_relaxed(header_of(pAnchor)->sp_flags, format::page_state::full);
-    trace_anchor_t *next = spool_enqueue(nullptr, nullptr, pAnchor, &spq, 0);
+    const qn::platform::no_cancel whole;
+    store_relaxed(header_of(full)->sp_flags, format::page_state::full);
+    trace_anchor_t *next = spool_enqueue(nullptr, nullptr, full, &spq, 0);
     if (next == nullptr) {
         set_error(QN_TR_ENOMEM, 14);
         return nullptr;
     }
     if (!ring_can_be_written(next)) {
-        spool_dequeue_and_delete_element(&spq, pAnchor); // the next record comes here again
+        spool_dequeue_and_delete_element(&spq, full); // the next record comes here again
         return nullptr;
     }
     for (;; next = next->nextPage) {
@@ -141,9 +144,15 @@ trace_record_header_t *pageFull(trace_anchor_t *pAnchor, unsigned int *pReqLengt
         const mutex_try_lock page_lock(next->anchorMutex);
         if (page_lock) {
             start_writing(next);
-            break;
+            return next;
         }
-        log_switch(LOG_ERR, "locked", next, load_relaxed(header_of(pAnchor)->sp_flags));
+        log_switch(LOG_ERR, "locked", next, load_relaxed(header_of(full)->sp_flags));
     }
-    return allocate_space_page(next, pReqLength);
+}
+} // namespace
+
+trace_record_header_t *pageFull(trace_anchor_t *pAnchor, unsigned int *pReqLength)
+{
+    // Space is reserved where the thread can be cancelled again: that may wait for a reader of the file.
+    return allocate_space_page(switch_pages(pAnchor), pReqLength);
 }

@@ -1,6 +1,8 @@
 // The records that the library writes itself: start, restart and time calibration.
 #include <cstring>
+#include <functional>
 #include <unistd.h>
+#include <utility>
 
 #include <gtest/gtest.h>
 
@@ -49,7 +51,24 @@ private:
 };
 
 record_image newest(const one_trace &trace) { return trace.image().records().back(); }
+
+std::function<void()> during_comparison; // runs once, inside the next strcmp() of the library
 } // namespace
+
+// In place of strcmp() in this program (linked with --wrap). Visible, because the linker looks at the shared libraries'
+// calls too.
+#pragma GCC visibility push(default)
+extern "C" {
+int __real_strcmp(const char *left, const char *right);
+
+int __wrap_strcmp(const char *left, const char *right)
+{
+    const auto action = std::exchange(during_comparison, nullptr);
+    if (action) action();
+    return __real_strcmp(left, right);
+}
+}
+#pragma GCC visibility pop
 
 TEST(StartRecord, IsTheFirstRecordOfANewFile)
 {
@@ -157,6 +176,25 @@ TEST(RestartRecord, NeedsAMessage)
     gCoreMessage = nullptr;
     EXPECT_EQ(int_record_start(&anchors), 0);
     EXPECT_EQ(newest(trace).function(), start_kind);
+}
+
+TEST(RestartRecord, CarriesTheMessageOfAnEventThatIsTakenBackMeanwhile)
+{
+    const one_trace trace;
+    const core_event event(trace.file(), "gone");
+    during_comparison = [] { tr_core_event_1(nullptr, nullptr); };
+    EXPECT_EQ(int_record_start(&anchors), 0);
+    EXPECT_EQ(gCoreMessage, nullptr);
+    EXPECT_EQ(newest(trace).function(), restart_kind);
+    EXPECT_EQ(newest(trace).text(52), "gone");
+}
+
+TEST(RestartRecord, ByItselfIsAStartRecordWithoutAMessage)
+{
+    const one_trace trace;
+    EXPECT_EQ(segfault_restart(&anchors), 0);
+    EXPECT_EQ(trace.image().records_of(start_kind).size(), 2U);
+    EXPECT_EQ(newest(trace).length(), 52U);
 }
 
 TEST(RestartRecord, IsWrittenAtEveryStartFromThenOn)

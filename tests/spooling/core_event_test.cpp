@@ -47,4 +47,32 @@ TEST(CoreEvent, MakesTheNextStartOfThatFileARestart)
     stop(crashed);
     stop(other);
 }
+
+// The kinds of the records with which the file is started.
+std::vector<uint16_t> kinds_after_start(const std::string &file)
+{
+    trace_anchor_t *anchor = anchor_for(file);
+    EXPECT_EQ(start(anchor), 0);
+    std::vector<uint16_t> kinds;
+    for (const record_image &record : trace_image::of_file(file).records()) kinds.push_back(record.function());
+    stop(anchor);
+    return kinds;
+}
+
+TEST(CoreEvent, IsTakenBackByOneWithoutAMessage)
+{
+    const scratch folder;
+    EXPECT_EQ(tr_core_event_1((folder / "a").c_str(), "signal 11"), 0);
+    EXPECT_EQ(tr_core_event_1((folder / "a").c_str(), nullptr), 0);
+    EXPECT_EQ(kinds_after_start(folder / "a"), std::vector<uint16_t>{16});
+}
+
+TEST(CoreEvent, IsNotKeptWithoutMemory)
+{
+    const scratch folder;
+    calls().malloc = [](size_t) -> void * { return nullptr; };
+    EXPECT_EQ(tr_core_event_1((folder / "a").c_str(), "signal 11"), 0);
+    calls() = {};
+    EXPECT_EQ(kinds_after_start(folder / "a"), std::vector<uint16_t>{16});
+}
 } // namespace

@@ -55,6 +55,23 @@ void fill_start(trace_record_start_t *record)
     cu_get_procspeed_1(&time_info);
     record->timeInfo = time_info;
 }
+
+qn_int32_t write_start(trace_anchor_t *anchor)
+{
+    write_own_record<trace_record_start_t>(anchor, format::kind::start, sizeof(trace_record_start_t), fill_start);
+    return 0;
+}
+
+qn_int32_t write_restart(trace_anchor_t *anchor, const char *message)
+{
+    const size_t text_length = std::strlen(message);
+    const auto length = static_cast<unsigned int>((text_length + sizeof(trace_record_start_t) + 4) & ~size_t{3});
+    write_own_record<trace_record_start_t>(anchor, format::kind::restart, length, [=](trace_record_start_t *record) {
+        fill_start(record);
+        std::memcpy(record + 1, message, text_length + 1);
+    });
+    return 0;
+}
 } // namespace
 
 qn_int32_t tr_core_event_1(const char *trc_file, const char *message)
@@ -67,24 +84,18 @@ qn_int32_t tr_core_event_1(const char *trc_file, const char *message)
 qn_int32_t int_record_start(trace_anchor_t *pAnchor)
 {
     if (master_override_off() || pAnchor->uMaxSize == 0) return 0;
+    // Loaded once: the event may be replaced or taken back at any moment.
+    const char *message = load_acquire(gCoreMessage);
     const char *core_file = load_acquire(gCoreTrcFile);
-    if (load_relaxed(gCoreMessage) != nullptr && core_file != nullptr && std::strcmp(core_file, pAnchor->fileName) == 0)
-        return segfault_restart(pAnchor);
-    write_own_record<trace_record_start_t>(pAnchor, format::kind::start, sizeof(trace_record_start_t), fill_start);
-    return 0;
+    const bool crashed = message != nullptr && core_file != nullptr && std::strcmp(core_file, pAnchor->fileName) == 0;
+    return crashed ? write_restart(pAnchor, message) : write_start(pAnchor);
 }
 
 qn_int32_t segfault_restart(trace_anchor_t *pAnchor)
 {
     if (pAnchor->uMaxSize == 0) return 0;
     const char *message = load_acquire(gCoreMessage);
-    const size_t text_length = std::strlen(message);
-    const auto length = static_cast<unsigned int>((text_length + sizeof(trace_record_start_t) + 4) & ~size_t{3});
-    write_own_record<trace_record_start_t>(pAnchor, format::kind::restart, length, [=](trace_record_start_t *record) {
-        fill_start(record);
-        std::memcpy(record + 1, message, text_length + 1);
-    });
-    return 0;
+    return message != nullptr ? write_restart(pAnchor, message) : write_start(pAnchor);
 }
 
 qn_int32_t __time_calibration(trace_anchor_t *pAnchor)

@@ -88,6 +88,39 @@ TEST_F(Flush, EndsAtThePageThatCannotBeSynced)
     EXPECT_TRUE(free_for_others(anchors.anchorMutex));
 }
 
+TEST_F(Flush, KeepsTheErrorOfThePageThatCannotBeSyncedWhilePagesArePinned)
+{
+    ASSERT_EQ(tr_pin_pages_1(1), 0);
+    fail_sync(3, EIO);
+    EXPECT_EQ(after(tr_flush_1()), msync_failure(EIO));
+}
+
+TEST_F(Flush, TouchesThePagesThatArePinnedEvenIfOneCannotBeSynced)
+{
+    ASSERT_EQ(tr_pin_pages_1(1), 0);
+    fail_sync(1, EIO);
+    global_debug_level = 8;
+    EXPECT_EQ(tr_flush_1(), 32);
+    EXPECT_TRUE(system_log_has("load_trace_pages_to_memory Entered\n"));
+    EXPECT_TRUE(
+        system_log_has("\ttrace: Load all part of the pages to bring into memory (" + (files / "single.trc") + ")\n"));
+    EXPECT_TRUE(system_log_has("load_trace_pages_to_memory() Leaving, rc=0\n"));
+}
+
+// A writer may have found its trace damaged, and have begun to start it afresh.
+TEST_F(Flush, TakesNoNoticeOfAPageThatIsUnmappedMeanwhile)
+{
+    const calls all = all_pages();
+    int syncs = 0;
+    during_sync([&] {
+        if (++syncs == 2) stop_trace_page(pages[0], 1);
+    });
+    fail_sync(2, ENOMEM);
+    leave_marker();
+    EXPECT_EQ(after(tr_flush_1()), success());
+    EXPECT_EQ(sync_calls(), all);
+}
+
 TEST_F(Flush, GoesOnBehindAPageThatCannotBeSyncedWhenErrorsAreIgnored)
 {
     fail_sync(3, EIO);

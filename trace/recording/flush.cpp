@@ -71,6 +71,26 @@ void touch_page(const trace_anchor_t *anchor, const trace_anchor_t *page)
     memvar_to_visit = memvar_to_visit | read_words(page->pMap, page->pMapEnd);
     if (debug_level_above(7)) syslog(LOG_DEBUG, "\ttrace: memvar_to_visit=0x%x\n", memvar_to_visit);
 }
+
+// All that load_trace_pages_to_memory() does but for the error record. The result of locking the global mutex.
+int touch_all_traces()
+{
+    debug("load_trace_pages_to_memory Entered\n");
+    {
+        const global_lock global;
+        if (!global) {
+            debug("load_trace_pages_to_memory Leaving with rc=%d\n", QN_TR_ELOCK);
+            return global.result();
+        }
+        if (anchors.bInitialized)
+            walk_pages([](const trace_anchor_t *anchor, const trace_anchor_t *page) {
+                touch_page(anchor, page);
+                return 0;
+            });
+    }
+    debug("load_trace_pages_to_memory() Leaving, rc=%d\n", 0);
+    return 0;
+}
 } // namespace
 
 namespace qn::tr
@@ -103,29 +123,16 @@ int msync_trace_pages(int incl_all_pages, int msync_flags, int ignore_error)
 
 int load_trace_pages_to_memory(void)
 {
-    debug("load_trace_pages_to_memory Entered\n");
-    {
-        const global_lock global;
-        if (!global) {
-            const int status = set_error_int(QN_TR_ELOCK, 9, global.result());
-            debug("load_trace_pages_to_memory Leaving with rc=%d\n", status);
-            return status;
-        }
-        if (anchors.bInitialized)
-            walk_pages([](const trace_anchor_t *anchor, const trace_anchor_t *page) {
-                touch_page(anchor, page);
-                return 0;
-            });
-    }
-    debug("load_trace_pages_to_memory() Leaving, rc=%d\n", 0);
-    return cu_set_no_error_1();
+    const int lock_result = touch_all_traces();
+    return lock_result != 0 ? set_error_int(QN_TR_ELOCK, 9, lock_result) : cu_set_no_error_1();
 }
 
 qn_int32_t tr_flush_1(void)
 {
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
     const qn_int32_t status = msync_trace_pages(1, MS_SYNC, 0);
-    if (load_relaxed(memory_is_pinned) != 0 && !master_override_off()) load_trace_pages_to_memory();
+    // The error record is that of the msync().
+    if (load_relaxed(memory_is_pinned) != 0 && !master_override_off()) touch_all_traces();
     return status;
 }
 

@@ -56,6 +56,20 @@ TEST_F(SwitchedSet, RestartsTheSequenceNumbers)
     EXPECT_EQ(page(2)->seqNumber, 2U);
 }
 
+// The start record is in another page, which may be gone before this one.
+TEST_F(SwitchedSet, RenewsTheTimeBaseOfThePage)
+{
+    calls().procspeed = [](cu_timeinfo_t *time) {
+        *time = {4711, 4712};
+        return 0;
+    };
+    switch_from(1);
+    calls() = {};
+    EXPECT_EQ(image_of(2).u64(24), 4711U);
+    EXPECT_EQ(image_of(2).u64(32), 4712U);
+    EXPECT_NE(image_of(1).u64(24), 4711U);
+}
+
 TEST_F(SwitchedSet, LeavesTheRequestedLengthAlone)
 {
     unsigned int length = 44;

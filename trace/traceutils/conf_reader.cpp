@@ -14,6 +14,7 @@
 #include "trace/files/error_report.h"
 #include "trace/files/releases.h"
 #include "trace/files/text.h"
+#include "trace/traceutils/c_locale.h"
 #include "trace/traceutils/conf_line.h"
 #include "trace/traceutils/raw_config.h"
 #include "trace/traceutils/traceutils.h"
@@ -221,6 +222,7 @@ qn_int32_t read_conf_file(const char *file_name, trace_raw_config_t **config, co
 {
     const file_ptr file(platform::open_text(file_name));
     if (file == nullptr) return QN_TR_ECONFOPEN;
+    const c_locale bytes_are_characters;
     const conf_patterns patterns;
     qn_int32_t status = patterns.status();
     if (status != 0) return status;

@@ -23,6 +23,7 @@ qn_uint32_t requested(const std::string &file)
     return anchor != nullptr ? anchor->uRequestedFileSize : 0;
 }
 
+const outcome no_name = failure(17, 17, "2625-016 Trace filename \"\" is invalid.\n");
 const outcome not_active = failure(25, 25, "Trace is not active so the size returned is the requested size.\n");
 
 TEST(FileSizeLanguage, ReadsElementsOfAFileAndASize)
@@ -154,10 +155,18 @@ TEST(FileSize, OfTheDefaultFileGoesByNoName)
 TEST(FileSize, OfAnUnknownFileIsRefusedAndMakesNoAnchor)
 {
     qn_uint32_t size = 4711;
-    EXPECT_EQ(after(tr_get_file_size_1("/tmp/never.trc", &size)),
-              failure(17, 17, "2625-016 Trace filename \"\" is invalid.\n"));
+    EXPECT_EQ(after(tr_get_file_size_1("/tmp/never.trc", &size)), no_name);
     EXPECT_EQ(size, 4711U);
     EXPECT_EQ(anchors.numAnchors, 1U);
+}
+
+TEST(FileSize, OfNoFileIsRefused)
+{
+    qn_uint32_t size = 4711;
+    EXPECT_EQ(after(tr_set_file_size_1(nullptr, 8192)), no_name);
+    EXPECT_EQ(after(tr_get_file_size_1(nullptr, &size)), no_name);
+    EXPECT_EQ(size, 4711U);
+    EXPECT_EQ(anchors.uRequestedFileSize, 65536U) << "NULL is not the default file";
 }
 
 TEST(FileSize, StaysAsItIsOnceTracingIsStopped)
@@ -168,6 +177,7 @@ TEST(FileSize, StaysAsItIsOnceTracingIsStopped)
     qn_uint32_t size = 4711;
     EXPECT_EQ(tr_set_file_size_1("/tmp/a.trc", 99), 0);
     EXPECT_EQ(tr_set_file_size_1("/tmp/b.trc", 99), 0);
+    EXPECT_EQ(tr_set_file_size_1(nullptr, 99), 0);
     EXPECT_EQ(tr_set_size_1(99), 0);
     EXPECT_EQ(tr_get_file_size_1("/tmp/a.trc", &size), 0);
     EXPECT_EQ(tr_get_file_size_1("/tmp/c.trc", &size), 0);

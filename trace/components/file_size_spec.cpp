@@ -85,6 +85,7 @@ qn_int32_t tr_set_file_size_1(const char *fileName, const qn_uint32_t size)
 {
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
     if (master_override_off()) return 0;
+    if (fileName == nullptr) return set_error(QN_TR_EFILENAME, 17);
     const global_lock global; // the lock's result is not looked at
     qn_int32_t status = init_default_anchor();
     if (status != 0) return status;
@@ -112,6 +113,7 @@ qn_int32_t tr_get_file_size_1(const char *fileName, qn_uint32_t *pSize)
 {
     pthread_once(&trace_global_data_once, initialize_trace_global_data);
     if (master_override_off()) return 0;
+    if (fileName == nullptr) return set_error(QN_TR_EFILENAME, 17);
     const global_lock global; // the lock's result is not looked at
     qn_int32_t status = init_default_anchor();
     if (status != 0) return status;

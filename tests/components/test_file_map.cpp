@@ -135,6 +135,23 @@ TEST(FileMap, CompilesOnlyThePatternsOfTheCall)
     EXPECT_TRUE(is_cancelled_in([&] { map_with_cancellation_in(last_compilation); }));
 }
 
+TEST(FileMap, ReportsThatMemoryRanOutForTheFileAndMeetsItAtTheNextCall)
+{
+    const scratch files;
+    client ab("AB", 1, 0);
+    ASSERT_EQ(ab.register_now(), 0);
+    {
+        const failing_allocation of_the_anchor(2); // behind the node
+        const qn_int32_t status = tr_set_file_map_1((files / "x.trc").c_str(), "AB:*");
+        ASSERT_TRUE(of_the_anchor.happened());
+        EXPECT_EQ(after(status), no_memory());
+    }
+    EXPECT_EQ(ab.tokens[0], nullptr);
+    EXPECT_EQ(after(tr_set_file_map_1((files / "y.trc").c_str(), "OTHER:*")), success());
+    ASSERT_NE(anchor_of(files / "x.trc"), nullptr);
+    EXPECT_EQ(ab.tokens[0], anchor_of(files / "x.trc"));
+}
+
 TEST(FileMap, ComesFromTheEnvironment)
 {
     const scratch files;

@@ -236,7 +236,7 @@ TEST(Registration, ChangesNothingWhenMemoryRunsOut)
 {
     client first("AB");
     ASSERT_EQ(first.register_now(), 0);
-    for (int number = 1; number <= 2; ++number) { // the block, the tokens
+    for (int number = 1; number <= 3; ++number) { // the block, the tokens, what they are mapped by
         client made("CD", 2);
         const failing_allocation out_of_memory(number);
         const qn_int32_t status = made.register_now();
@@ -246,6 +246,18 @@ TEST(Registration, ChangesNothingWhenMemoryRunsOut)
         EXPECT_EQ(registered_ids(), std::vector<std::string>{"AB"});
     }
     EXPECT_TRUE(free_for_others(anchors.anchorMutex));
+}
+
+TEST(Registration, StandsAlthoughMemoryRanOutForAMappedFile)
+{
+    ASSERT_EQ(tr_set_file_map_1("/tmp/never.trc", "AB:*"), 0);
+    client made("AB", 1, 0);
+    const failing_allocation of_the_anchor(4); // behind the block, the tokens and what they are mapped by
+    const qn_int32_t status = made.register_now();
+    ASSERT_TRUE(of_the_anchor.happened());
+    EXPECT_EQ(after(status), no_memory());
+    EXPECT_EQ(made.tokens[0], nullptr);
+    EXPECT_EQ(registered_ids(), std::vector<std::string>{"AB"});
 }
 
 TEST(Registration, IsUndoneWhenTheThreadIsCancelledWhileItStartsAFile)

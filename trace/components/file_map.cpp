@@ -136,6 +136,14 @@ void apply_file_map()
     while (spec != nullptr && spec->matched) spec = spec->pNext;
     for (; spec != nullptr; spec = spec->pNext) process_map_spec(&anchors, spec, nullptr);
 }
+
+// 0, or 14 after recording it when memory ran out for a file. The next call looks that one up again.
+qn_int32_t check_mapped_files()
+{
+    const component_anchor_t *component = anchors.pFirstComp;
+    while (component != nullptr && !lacks_mapped_file(component)) component = component->pNext;
+    return component != nullptr ? set_error(QN_TR_ENOMEM, 14) : 0;
+}
 } // namespace
 
 qn_int32_t tr_set_file_map_1(const char *fileName, const char *selectString)
@@ -154,6 +162,7 @@ qn_int32_t tr_set_file_map_1(const char *fileName, const char *selectString)
         if (status != 0) return status;
         apply_file_map();
         status = start_traces_that_are_on();
+        if (status == 0) status = check_mapped_files();
     }
     return status != 0 ? status : cu_set_no_error_1();
 }

@@ -272,6 +272,15 @@ TEST(Registration, IsUndoneWhenTheThreadIsCancelledWhileItStartsAFile)
     EXPECT_EQ(after(made.register_now()), success());
 }
 
+TEST(Registration, LeavesTheLevelsAt0WhenTheThreadIsCancelledInIt)
+{
+    const scratch files;
+    ASSERT_EQ(tr_set_filename_1((files / "a.trc").c_str()), 0);
+    client made("AB", 2);
+    ASSERT_TRUE(is_cancelled_in([&] { made.register_now(); })); // while it starts the file
+    EXPECT_EQ(made.levels, levels(2, 0)) << "nothing can switch them off any more";
+}
+
 TEST(RegistrationCleanup, UnlinksAndFreesTheComponentAtTheHeadAndUnlocks)
 {
     client first("AB");

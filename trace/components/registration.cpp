@@ -90,6 +90,12 @@ void link_component(component_anchor_t *component)
     anchors.pFirstComp = component;
 }
 
+// The client's trace points fall silent.
+void switch_levels_off(const component_anchor_t *component)
+{
+    for (int i = 0; i < component->numberOfCategories; ++i) store_relaxed(component->pDetailLevels[i], 0);
+}
+
 void apply_specifications(component_anchor_t *component)
 {
     for (trace_level_spec_t *spec = anchors.pFirstTraceSpec; spec != nullptr; spec = spec->pNext)
@@ -107,7 +113,9 @@ public:
     registration &operator=(const registration &) = delete;
     ~registration()
     {
-        if (result_ == 0) register_cleanup(&component_);
+        if (result_ != 0) return;
+        if (component_ != nullptr) switch_levels_off(component_);
+        register_cleanup(&component_);
     }
 
     int result() const { return result_; }
@@ -174,7 +182,7 @@ qn_int32_t tr_unregister_component_1(const qn_char_t *pComponentId)
         component_anchor_t *component = find_component(pComponentId);
         if (component == nullptr) return set_error_str(QN_TR_ENOTREGISTERED, 26, pComponentId);
 
-        for (int i = 0; i < component->numberOfCategories; ++i) store_relaxed(component->pDetailLevels[i], 0);
+        switch_levels_off(component);
         unlink_component(component);
         free_component(component);
         for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = load_acquire(anchor->next))

@@ -6,7 +6,9 @@
 #include "components/components_seen.h"
 #include "components/mutexes.h"
 #include "components/outcome.h"
+#include "components/page_set.h"
 #include "support/scratch.h"
+#include "support/system_log.h"
 
 namespace
 {
@@ -77,6 +79,29 @@ TEST(Unregistration, KeepsTheFileThatAnotherComponentTracesTo)
     EXPECT_NE(anchors.pMap, nullptr);
     EXPECT_EQ(tr_unregister_component_1("TWO"), 0);
     EXPECT_EQ(anchors.pMap, nullptr) << "a component whose levels are 0 keeps no file";
+}
+
+TEST(Unregistration, StopsEveryPageOfASet)
+{
+    const scratch files;
+    trace_anchor_t *set = make_page_set(files / "set", 3, 16384);
+    client made("AB");
+    ASSERT_EQ(made.register_now(), 0);
+    for (const trace_anchor_t *page : pages_of(set)) ASSERT_NE(page->pMap, nullptr);
+    EXPECT_EQ(after(tr_unregister_component_1("AB")), success());
+    for (const trace_anchor_t *page : pages_of(set)) EXPECT_EQ(page->pMap, nullptr) << page->fileName;
+    EXPECT_EQ(pages_of(set).size(), 3U) << "the set itself stays";
+}
+
+TEST(Unregistration, LeavesAFileAloneThatIsNotStarted)
+{
+    setenv("QN_TR_DEBUG_LEVEL", "8", 1);
+    ASSERT_EQ(tr_set_file_size_1("/tmp/never.trc", 8192), 0);
+    client silent("OFF", 1, 0);
+    ASSERT_EQ(silent.register_now(), 0);
+    clear_system_log();
+    ASSERT_EQ(tr_unregister_component_1("OFF"), 0);
+    EXPECT_FALSE(system_log_has("*** stop_trace for /tmp/never.trc"));
 }
 
 TEST(Unregistration, RefusesAMissingIdentifier)

@@ -104,6 +104,13 @@ void apply_specifications(component_anchor_t *component)
         process_map_spec(&anchors, spec, component);
 }
 
+void stop_if_off(trace_anchor_t *anchor)
+{
+    if (is_trace_on(anchor)) return;
+    const anchor_set_lock set(anchor);
+    if (set && anchor->pMap != nullptr) stop_trace(anchor, load_relaxed(this_is_child));
+}
+
 // Holds the global mutex and the component being built; gives both up unless the registration came to its end.
 class registration
 {
@@ -186,7 +193,7 @@ qn_int32_t tr_unregister_component_1(const qn_char_t *pComponentId)
         unlink_component(component);
         free_component(component);
         for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = load_acquire(anchor->next))
-            if (!is_trace_on(anchor)) stop_trace_locked(anchor);
+            stop_if_off(anchor);
     }
     return cu_set_no_error_1();
 }

@@ -20,7 +20,8 @@ constexpr qn_int32_t default_level = -1;
 int scan_category_pattern(specification_text &from, size_t end, pattern_text &category)
 {
     const size_t start = from.at;
-    from.at = std::min(end, from.text.find('=', start));
+    const std::string_view element = from.text.substr(0, end); // else a long text is searched to its end for each
+    from.at = std::min(end, element.find('=', start));
     size_t length = from.at - start;
     while (length > 0 && from.text[start + length - 1] == ' ') --length;
     if (length == 0) return set_error_int(QN_TR_ESPECCAT, 12, static_cast<int>(from.at));

@@ -7,6 +7,7 @@
 #include "components/components_seen.h"
 #include "components/mutexes.h"
 #include "components/outcome.h"
+#include "components/page_set.h"
 #include "support/failing_memory.h"
 #include "support/scratch.h"
 #include "support/system_log.h"
@@ -258,6 +259,35 @@ TEST(Registration, StandsAlthoughMemoryRanOutForAMappedFile)
     EXPECT_EQ(after(status), no_memory());
     EXPECT_EQ(made.tokens[0], nullptr);
     EXPECT_EQ(registered_ids(), std::vector<std::string>{"AB"});
+}
+
+TEST(Registration, StandsAlthoughMemoryRanOutForItsPageSet)
+{
+    const scratch files;
+    setenv("QN_TR_SPOOL", ("a.trc:ON:4:" + files / "spool").c_str(), 1);
+    ASSERT_EQ(tr_set_filename_1((files / "a.trc").c_str()), 0);
+    std::vector<outcome> seen;
+    for (int number = 4;; ++number) { // behind the component's own
+        client made("AB", 2);
+        qn_int32_t status = 0;
+        {
+            const failing_allocation out_of_memory(number);
+            status = made.register_now();
+            if (!out_of_memory.happened()) break;
+        }
+        seen.push_back(after(status));
+        EXPECT_EQ(made.levels, levels(2, 1));
+        EXPECT_EQ(made.register_now(), 38) << "it is registered";
+        EXPECT_EQ(anchors.pMap, nullptr);
+        ASSERT_EQ(tr_unregister_component_1("AB"), 0);
+    }
+    EXPECT_NE(anchors.pMap, nullptr) << "the next registration starts it";
+    outcome no_page = no_memory();
+    no_page.status = -1;
+    const std::vector<outcome> of_the_others(pages_of(&anchors).size() - 2, no_page); // the mutex is kept
+    ASSERT_FALSE(seen.empty());
+    EXPECT_EQ(seen.front(), no_memory()) << "of the set's mutex";
+    EXPECT_EQ(std::vector(seen.begin() + 1, seen.end()), of_the_others);
 }
 
 TEST(Registration, IsUndoneWhenTheThreadIsCancelledWhileItStartsAFile)

@@ -69,6 +69,18 @@ TEST(SetLevels, ClearsTheErrorRecord)
     EXPECT_EQ(after(tr_set_trace_levels_1("*:*")), success());
 }
 
+TEST(SetLevels, AreSetAlsoOnceTracingIsStopped)
+{
+    client made("AB");
+    ASSERT_EQ(made.register_now(), 0);
+    global_stop_trace();
+    leave_marker();
+    EXPECT_EQ(after(tr_set_trace_levels_1("AB:*=9")), success());
+    EXPECT_EQ(made.levels, levels{9});
+    EXPECT_EQ(count_of(anchors.pFirstTraceSpec), 1U);
+    EXPECT_EQ(after(tr_set_trace_levels_1(":")), syntax_error(10, 0));
+}
+
 TEST(SetLevels, FailsWhenTheGlobalMutexCannotBeTaken)
 {
     client made("AB");

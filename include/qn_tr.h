@@ -17,9 +17,10 @@
  *
  * RULES THAT HOLD FOR EVERY FUNCTION, UNLESS IT SAYS OTHERWISE
  *
- * Status      0 is success, a positive number one of the QN_TR_E... codes below. The control functions also leave the
- *             calling thread's error record (cu_get_error_1 of qn_cu.h) with the code and a message; on success they
- *             record that no error occurred. The record writers return bare codes and leave the error record alone.
+ * Status      0 is success, a positive number one of the QN_TR_E... codes below; -1 says that memory ran out for a page
+ *             of a page set. The control functions also leave the calling thread's error record (cu_get_error_1 of
+ *             qn_cu.h) with the code, 14 for -1, and a message; on success they record that no error occurred. The
+ *             record writers return bare codes and leave the error record alone.
  * Strings     are NUL-terminated bytes, copied during the call; the caller keeps its own.
  * Threads     Every function may be called from any thread at any time.
  * Signals     A signal handler may write records to a trace that is a single file with the writers that neither format
@@ -28,8 +29,8 @@
  *             function may be called from a handler: they allocate memory, and so does a page set when a page is full.
  * Cancelling  A thread cancelled (deferred cancellation) inside a call releases every lock that the call had taken and
  *             undoes what was half made. Asynchronous cancellation is not supported.
- * Fork        In a child made by fork() tracing is off for good: writers return 0 and write nothing, and no file of
- *             the parent is touched.
+ * Fork        In a child made by fork() after the library was initialised tracing is off for good: writers return 0 and
+ *             write nothing, and no file of the parent is touched. One forked before that traces like any process.
  * Start-up    is lazy: the first call that needs the library reads the environment (QN_TR_FILENAME, QN_TR_SIZE,
  *             QN_TR_DEBUG_LEVEL, QN_TR_USE_MSYNC, QN_TR_TRACE_LEVELS, QN_TR_FILE_MAP, QN_TR_FILE_SIZE, QN_TR_SPOOL)
  *             and registers tr_term() with atexit().
@@ -40,8 +41,10 @@
  *             trace goes on with it. Within a process a file is one trace: one that is to be started while it is in
  *             use under another name - a link to it, "./f" for "f", a page of a page set - is refused with
  *             QN_TR_EOPEN (error EBUSY), and nothing is recorded there until a control function starts it again.
- * Stopped     After tr_term(), and in a forked child, tracing is stopped for good. The writers, tr_set_multipage_1,
- *             tr_set_file_map_1 and the size functions then return 0 and do nothing.
+ * Stopped     After tr_term(), and in such a child, tracing is stopped for good. The writers, tr_set_multipage_1,
+ *             tr_set_file_map_1 and the size functions then return 0 and do nothing. Registering after tr_term()
+ *             initialises the library again and starts the file that QN_TR_FILENAME names, but nothing is recorded, and
+ *             the component cannot be unregistered (9).
  */
 #ifndef QN_TR_H
 #define QN_TR_H
@@ -117,7 +120,8 @@ typedef struct tr_category_description {
     qn_uint32_t category_id;             /* index of the category in the level array; below the number of categories */
     const qn_char_t *category_name;      /* what level and file map specifications call it; not empty */
     qn_uint32_t default_level_of_detail; /* 0 to 255: the level that a specification without "=level" sets */
-    qn_uint32_t minimum_level_of_detail; /* 0 to 255: the level at registration; no specification goes below it */
+    qn_uint32_t minimum_level_of_detail; /* 0 to 255: the level at registration; a level from 0 to 255 that a
+                                            specification gives is raised to it, a default level is not */
 } tr_category_description_t;
 
 /* Non-zero when CATEGORY traces at LEVEL or above. Costs one byte load and a compare. */
@@ -150,9 +154,11 @@ typedef struct tr_category_description {
  *
  * Two identifiers are the same when their first four characters are. Returns 0 or
  *   1, 2, 3, 4, 38, 5, 6, 7, 8  the first check that failed, in this order; nothing was changed
- *   9, 14                       lock or memory failure; the component is not registered
- *   17 to 23, 35                a trace file could not be started. The component is registered all the same, its
- *                               levels are set, and its records are dropped until the file can be started.
+ *   9, 14                       lock or memory failure: nothing could be registered, or a trace file could not be made
+ *                               or started. A second call tells: it returns 38 when the component is registered.
+ *   -1, 17 to 23, 35            a trace file could not be started
+ * A component whose trace file could not be started is registered all the same: its levels are set, and its records are
+ * dropped until the file can be started.
  * The levels are written with the library's global lock held and may be read at any time without one.
  */
 QN_EXPORT qn_int32_t tr_ms_register_component_1(const qn_char_t *pComponentId, tr_detail_level_t *pLevelArray,
@@ -185,7 +191,8 @@ QN_EXPORT qn_int32_t tr_unregister_component_1(const qn_char_t *pComponentId);
  *
  * The specification is taken whole or not at all. pLevelString must not be NULL. Returns 0, 9, 14, or
  *   10, 11, 12, 13, 15, 16  a syntax error, with its offset in the message; no level was changed
- *   17 to 23, 35            the last trace file that now has something to trace could not be started
+ *   -1, 17 to 23, 35        the last trace file that now has something to trace could not be started (9 and 14 may
+ *                           mean that too; the levels are set then)
  * The patterns go to regcomp() and regexec(), with the library's global lock held. One that would take these gigabytes,
  * minutes or the stack, and one with back references, is refused like one that is no regular expression (15 or 16):
  * docs/patterns.md tells what is.
@@ -217,12 +224,12 @@ QN_EXPORT void tr_release_comp_info_1(const int componentCount, tr_mini_componen
 
 /*
  * Names the default trace file, which every category without a file of its own writes to, and starts it when some
- * category traces. An existing file is continued when it is sound, of at least the right size and written by the same
- * program; otherwise its ring is initialised afresh.
+ * category traces. An existing file is continued when it is sound, of exactly the size that is asked for and written by
+ * the same program; otherwise its ring is initialised afresh, and a larger file stays as large as it is.
  *
  * pFileName  at most 4095 characters; longer names are cut. The current name changes nothing. An empty name ends
  *            tracing to the default file. NULL stops every trace file of the process; their names stay.
- * Returns 0, 9, 14, or 17 to 23 and 35 when the file could not be started (the name is kept).
+ * Returns 0, 9, or -1, 14, 17 to 23 and 35 when the file could not be started (the name is kept).
  */
 QN_EXPORT qn_int32_t tr_set_filename_1(const qn_char_t *pFileName);
 
@@ -242,16 +249,23 @@ QN_EXPORT qn_int32_t tr_set_multipage_1(const qn_uint32_t state);
  * as in tr_set_trace_levels_1, one pair a call. It holds for registered components and for those that register later;
  * later maps win. The client passes the tokens that the registration gave it to the tr_ms_ writers. The environment
  * variable QN_TR_FILE_MAP holds elements "file,component:category" separated by ";".
- * Returns 0, 9, 14, or 10, 11, 12, 15, 16 for a syntax error, with its offset (nothing was changed), or 17 to 23 and
- * 35 when the last trace file that now has something to trace could not be started.
+ * Returns 0, 9, 17 when fileName is NULL, 10, 11, 12, 15, 16 for a syntax error, with its offset (nothing was changed),
+ * or -1, 17 to 23 and 35 when the last trace file that now has something to trace could not be started. 14 says that
+ * memory ran out: for the element (nothing was changed), a start, or a file that the map names, whose categories stay
+ * with the default file until the next call.
  */
 QN_EXPORT qn_int32_t tr_set_file_map_1(const char *fileName, const char *selectString);
 
 /*
  * Asks for a size in bytes of the trace file fileName (the empty name: the default file). The size is rounded up to
  * memory pages; an existing larger file stays as large as it is. A trace that is active is stopped and started again,
- * which initialises its ring unless the size stays the same. The environment variables QN_TR_SIZE (default file) and
- * QN_TR_FILE_SIZE (elements "file,size" separated by ";") do the same. Returns 0, 9, 14, or 17 to 23 and 35.
+ * which initialises its ring unless the file has exactly that size. The environment variables QN_TR_SIZE (default file)
+ * and QN_TR_FILE_SIZE (elements "file,size" separated by ";") do the same.
+ *
+ * A page set is made of pages of 262144 bytes: as many as the size holds, at least 4, or as many as the configuration
+ * says. Resizing one that has been started leaves their number as it is, and makes them about a quarter larger at most.
+ *
+ * Returns 0, 9, 17 when fileName is NULL, or -1, 14, 17 to 23 and 35 when the file could not be made or started.
  */
 QN_EXPORT qn_int32_t tr_set_file_size_1(const char *fileName, const qn_uint32_t size);
 
@@ -259,8 +273,9 @@ QN_EXPORT qn_int32_t tr_set_file_size_1(const char *fileName, const qn_uint32_t 
 QN_EXPORT qn_int32_t tr_set_size_1(const qn_uint32_t newSize);
 
 /*
- * Gives the size in bytes of the trace file fileName (the empty name: the default file). Returns 0 with the mapped
- * size, 25 with the requested size when the trace is not active, 17 when there is no such trace file, or 9.
+ * Gives the size in bytes of the trace file fileName (the empty name: the default file), of a page set that of one
+ * page. Returns 0 with the mapped size, 25 with the requested size when the trace is not active, 17 when there is no
+ * such trace file or fileName is NULL, or 9.
  */
 QN_EXPORT qn_int32_t tr_get_file_size_1(const char *fileName, qn_uint32_t *pSize);
 
@@ -563,7 +578,8 @@ QN_EXPORT qn_int32_t tr_open_query_1(const qn_char_t *file_name, tr_query_handle
 /* Releases a handle. Returns 0, or 37 when it is not a valid one. */
 QN_EXPORT qn_int32_t tr_close_query_1(tr_query_handle_t handle);
 
-/* Gives the process that last started the file. Returns 0 or 37. */
+/* Gives the process that last started the file; once a start record has been overwritten, the process that wrote that
+ * one. Returns 0 or 37. */
 QN_EXPORT qn_int32_t tr_query_pid_1(tr_query_handle_t handle, pid_t *pid_p);
 
 /* Gives the program's name as it was invoked, a copy that the caller frees with free(). Returns 0, 14 or 37. */

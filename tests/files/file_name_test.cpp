@@ -243,6 +243,21 @@ TEST_F(DefaultPageSet, IsTakenApartForAnotherName)
     });
 }
 
+TEST_F(DefaultPageSet, LeadsAForkedChildToNoFreedPage)
+{
+    int children = 0;
+    calls().free = [&children, page = anchors.nextPage](void *memory) {
+        if (memory == page) {
+            std::memset(memory, 0xEE, sizeof *page); // as another thread may, which is given that memory
+            EXPECT_TRUE(in_child([] { return true; }));
+            ++children;
+        }
+        __real_free(memory);
+    };
+    EXPECT_EQ(tr_set_filename_1((folder / "g").c_str()), 0);
+    EXPECT_EQ(children, 1);
+}
+
 TEST_F(DefaultPageSet, StopsWholeForANullPointer)
 {
     const trace_anchor_t *second = anchors.nextPage;

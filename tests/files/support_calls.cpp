@@ -124,6 +124,12 @@ void *__wrap_calloc(size_t count, size_t size)
     return calls().calloc ? calls().calloc(count, size) : __real_calloc(count, size);
 }
 
+void __wrap_free(void *memory)
+{
+    if (calls().free) return calls().free(memory);
+    __real_free(memory);
+}
+
 nl_catd __wrap_catopen(const char *name, int flag)
 {
     return calls().catopen ? calls().catopen(name, flag) : __real_catopen(name, flag);

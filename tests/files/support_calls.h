@@ -49,6 +49,7 @@ struct call_hooks {
     std::function<int(useconds_t)> usleep;
     std::function<void *(size_t size)> malloc;
     std::function<void *(size_t count, size_t size)> calloc;
+    std::function<void(void *memory)> free;
     std::function<nl_catd(const char *name, int flag)> catopen;
     std::function<int(nl_catd)> catclose;
     std::function<int(pthread_cond_t *)> cond_signal;
@@ -77,6 +78,7 @@ int __real_fchmod(int fd, mode_t mode);
 void *__real_mmap(void *place, size_t size, int protection, int flags, int fd, off_t offset);
 int __real_msync(void *map, size_t size, int flags);
 void *__real_calloc(size_t count, size_t size);
+void __real_free(void *memory);
 nl_catd __real_catopen(const char *name, int flag);
 int __real_catclose(nl_catd catalogue);
 }

@@ -76,6 +76,25 @@ TEST_F(Termination, EmptiesTheAnchorsButKeepsThemInTheList)
     anchors.pFirstSpoolSpec = anchors.pLastSpoolSpec = nullptr;
 }
 
+TEST_F(Termination, LeadsAForkedChildToNoFreedSpecification)
+{
+    ASSERT_EQ(tr_set_trace_levels_1("ABCD:*=3"), 0);
+    int children = 0;
+    calls().free = [&children, spec = anchors.pLastTraceSpec](void *memory) {
+        if (memory == spec) {
+            EXPECT_TRUE(in_child([] {
+                return tr_set_trace_levels_1("ABCD:*=4") == 0 && anchors.pFirstTraceSpec == anchors.pLastTraceSpec &&
+                       anchors.pFirstTraceSpec->pPrev == nullptr;
+            }));
+            ++children;
+        }
+        __real_free(memory);
+    };
+    tr_term();
+    calls() = {};
+    EXPECT_EQ(children, 1);
+}
+
 TEST_F(Termination, LeavesEveryWriterReturningZeroWithoutWriting)
 {
     tr_term();

@@ -208,11 +208,13 @@ qn_int32_t become_unbound(trace_anchor_t *anchor)
     if (!set) return set_error_int(QN_TR_ELOCK, 9, set.result());
     const qn_int32_t status = stop_trace(anchor, load_relaxed(this_is_child));
     release_all_obsolete_pages(anchor);
-    free_pages(anchor, anchor->nextPage);
+    // Cut off before they are freed: a child that another thread forks meanwhile walks the ring.
+    trace_anchor_t *pages = anchor->nextPage;
     store_relaxed(anchor->nextPage, nullptr);
     anchor->pActivePg = nullptr;
     anchor->ppActivePg = nullptr;
     anchor->p_head_spool_anchor = nullptr;
+    free_pages(anchor, pages);
     forget_binding(anchor);
     return status;
 }

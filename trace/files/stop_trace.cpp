@@ -17,16 +17,17 @@ namespace
 {
 using namespace qn::tr;
 
-// Frees a list and clears its ends.
+// Frees a list and clears its ends: first, since a child that another thread forks meanwhile goes by them.
 template <class Node>
 void free_list(Node *&first, Node *&last)
 {
-    while (first != nullptr) {
-        Node *next = first->pNext;
-        std::free(first);
-        first = next;
+    Node *node = first;
+    first = last = nullptr;
+    while (node != nullptr) {
+        Node *next = node->pNext;
+        std::free(node);
+        node = next;
     }
-    last = nullptr;
 }
 
 void free_components(trace_anchor_t *anchor)

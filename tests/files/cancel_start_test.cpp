@@ -118,6 +118,46 @@ TEST_F(CancelledStart, InAChangeOfTheFileNameLeavesTheLibraryFree)
     expect_nothing_left(&anchors, descriptors);
 }
 
+// A number that was closed is another file's at once, and the trace that had it may not have taken note yet.
+TEST_F(CancelledStart, LeavesATraceAloneThatHasTheSameDescriptor)
+{
+    trace_anchor_t *anchor = anchor_for(folder / "f");
+    trace_anchor_t *other = anchor_for(folder / "other");
+    ASSERT_EQ(start(other), 0);
+    calls().fsync = [&](int fd) {
+        other->mapFd = fd;
+        thread.block();
+        return 0;
+    };
+    const int descriptors = open_descriptors();
+    EXPECT_TRUE(thread.run([&] { start(anchor); }));
+    EXPECT_NE(other->pMap, nullptr);
+    other->mapFd = -1;
+    expect_nothing_left(anchor, descriptors);
+    stop(other);
+}
+
+// A writer, who starts its own damaged trace afresh, holds no lock that would keep the pages of other traces there.
+TEST_F(CancelledStart, OfADamagedTraceByItsWriterLooksAtNoPagesOfOthers)
+{
+    client program("ABCD");
+    ASSERT_EQ(program.register_now(), 0);
+    trace_anchor_t *anchor = anchor_for(folder / "f");
+    ASSERT_EQ(start(anchor), 0);
+    anchor->pNextFree->length = 0;
+    void *gone = mmap(nullptr, sizeof(trace_anchor_t), PROT_NONE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+    ASSERT_NE(gone, MAP_FAILED);
+    trace_anchor_t *other = anchor_for(folder / "other");
+    other->nextPage = static_cast<trace_anchor_t *>(gone);
+    block_in_fsync();
+    const int descriptors = open_descriptors();
+    EXPECT_TRUE(thread.run([&] { tr_ms_record_id_1("ABCD", 1, anchor); }));
+    other->nextPage = nullptr;
+    munmap(gone, sizeof(trace_anchor_t));
+    EXPECT_TRUE(exists(folder / "f.save"));
+    expect_nothing_left(anchor, descriptors);
+}
+
 // Without standard input, a trace file is opened as descriptor 0.
 class StartWithDescriptorZero : public CancelledStart
 {
@@ -212,6 +252,7 @@ TEST(CancelStartTrace, UnmapsTheFileThatWasBeingOpened)
     anchor->mapFd = fd;
     const unsigned char *map = anchor->pMap;
     cancel_start_trace(&fd);
+    EXPECT_EQ(anchor->mapFd, -1);
     EXPECT_EQ(anchor->pMap, nullptr);
     EXPECT_EQ(anchor->pMapEnd, nullptr);
     unsigned char resident[16];

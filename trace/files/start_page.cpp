@@ -25,21 +25,29 @@ namespace
 {
 using namespace qn::tr;
 
-// The anchor, in the list or in the page set of one that is, whose file is being opened as `fd`.
+// The trace file that is being opened as `fd`. Pages are not looked at: without their lock they may be freed meanwhile.
 trace_anchor_t *anchor_being_opened(int fd)
 {
-    for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = load_acquire(anchor->next)) {
-        trace_anchor_t *found = nullptr;
-        for_each_page(anchor, [&](trace_anchor_t *page) {
-            if (page->mapFd == fd) found = page;
-        });
-        if (found != nullptr) return found;
+    trace_anchor_t *anchor = &anchors;
+    while (anchor != nullptr && anchor->mapFd != fd) anchor = load_acquire(anchor->next);
+    return anchor;
+}
+
+// Undoes what there is of a start: the mapping of the anchor, if any, and the descriptor. The anchor lets go of the
+// number first, which another thread may be given as soon as it is closed. Descriptor 0 is left open: it may be the
+// client's own standard input.
+void give_up_start(trace_anchor_t *anchor, int fd)
+{
+    if (anchor != nullptr) {
+        if (anchor->pMap != nullptr) unmap_page(anchor);
+        anchor->mapFd = -1;
     }
-    return nullptr;
+    if (fd != -1 && fd != 0) qn::platform::close_for_sure(fd);
 }
 
 // Undoes everything unless the start came to its end: on a failure as on a cancellation, the descriptor is closed and
-// the anchor stays unmapped. Only a cancellation leaves descriptor 0 open.
+// the anchor stays unmapped. Only a cancellation leaves descriptor 0 open. Other traces are not looked at: a writer who
+// starts its damaged trace afresh holds no lock of theirs.
 class start_in_progress
 {
 public:
@@ -48,18 +56,18 @@ public:
     start_in_progress &operator=(const start_in_progress &) = delete;
     ~start_in_progress()
     {
-        cancel_start_trace(&fd_);
-        if (!done_ && anchor_->pMap != nullptr) unmap_page(anchor_);
-        if (!done_) release_file(anchor_);
-        anchor_->mapFd = -1;
+        if (done_) return;
+        give_up_start(anchor_, fd_);
+        release_file(anchor_);
     }
 
     int fd() const { return fd_; }
     void opened(int fd) { anchor_->mapFd = fd_ = fd; }
     void close_descriptor()
     {
-        if (fd_ != -1) qn::platform::close_for_sure(fd_);
+        const int fd = fd_;
         anchor_->mapFd = fd_ = -1;
+        if (fd != -1) qn::platform::close_for_sure(fd);
     }
     qn_int32_t failed(qn_int32_t status)
     {
@@ -171,11 +179,7 @@ void log_start(const trace_anchor_t *anchor)
 void cancel_start_trace(void *pArg)
 {
     const int fd = *static_cast<int *>(pArg);
-    if (fd == -1) return;
-    trace_anchor_t *anchor = anchor_being_opened(fd);
-    if (anchor != nullptr && anchor->pMap != nullptr) unmap_page(anchor);
-    // Descriptor 0 is left open: it may be the client's own standard input.
-    if (fd != 0) qn::platform::close_for_sure(fd);
+    if (fd != -1) give_up_start(anchor_being_opened(fd), fd);
 }
 
 qn_int32_t start_trace_page(trace_anchor_t *anchor)

@@ -198,6 +198,7 @@ protected:
         spool.pages = 2;
         spool.pg_size = 65536;
         anchors.spool = &spool;
+        anchors.uRequestedFileSize = requested_size;
         ASSERT_EQ(tr_set_filename_1((folder / "t").c_str()), 0);
         ASSERT_NE(anchors.nextPage, nullptr);
         ASSERT_NE(anchors.nextPage, &anchors);
@@ -209,6 +210,16 @@ protected:
         qn::tr::store_relaxed(anchors.spool, nullptr);
     }
 
+    // Gives the default trace that name, which no specification governs: a page set of the library's own making.
+    qn_uint32_t pages_of_implicit_set(const std::string &name)
+    {
+        EXPECT_EQ(tr_set_filename_1((folder / name).c_str()), 0);
+        qn_uint32_t pages = 0;
+        qn::tr::for_each_page(&anchors, [&](const trace_anchor_t *) { ++pages; });
+        return pages;
+    }
+
+    static constexpr qn_uint32_t requested_size = 2097152;
     client program{"ABCD"};
 };
 
@@ -241,6 +252,21 @@ TEST_F(DefaultPageSet, IsTakenApartForAnotherName)
     qn::tr::for_each_page(&anchors, [this](const trace_anchor_t *page) {
         EXPECT_EQ(std::string(page->fileName).rfind(folder / "g", 0), 0U) << page->fileName;
     });
+}
+
+// The next file is a single one: traces may have no pages any more.
+TEST_F(DefaultPageSet, LeavesTheNextNameTheSizeThatWasAskedFor)
+{
+    anchors.bMultipageEnabled = 0;
+    EXPECT_EQ(tr_set_filename_1((folder / "g").c_str()), 0);
+    EXPECT_EQ(trace_image::of_file(folder / "g").size(), requested_size);
+}
+
+TEST_F(DefaultPageSet, HasAsManyPagesUnderTheNextName)
+{
+    const qn_uint32_t pages = pages_of_implicit_set("g");
+    EXPECT_EQ(pages, requested_size / 262144);
+    EXPECT_EQ(pages_of_implicit_set("h"), pages);
 }
 
 TEST_F(DefaultPageSet, LeadsAForkedChildToNoFreedPage)

@@ -36,6 +36,7 @@ void initAnchor(trace_anchor_t *anchor)
     anchor->bMultipageEnabled = 0;
     anchor->mapFd = -1;
     anchor->uRequestedFileSize = default_file_size;
+    anchor->uRequestedTraceSize = 0;
     anchor->fileName[0] = '\0';
     anchor->pFirstComp = nullptr;
     anchor->pMap = nullptr;

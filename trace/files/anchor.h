@@ -47,7 +47,8 @@ struct trace_anchor {
     qn_int32_t pageSize;                  // of memory
     component_anchor_t *pFirstComp;       // default anchor. Global mutex and component list mutex
     char fileName[trace_file_name_bytes]; // empty: no file. Global mutex; a page set's head has its first page's name
-    qn_uint32_t uRequestedFileSize;       // bytes
+    qn_uint32_t uRequestedFileSize;       // bytes; of a page, once the file is one
+    qn_uint32_t uRequestedTraceSize;      // page set's head: what was asked for of the whole, bytes; 0: not a page set
     qn_uint32_t uActualFileSize;          // bytes mapped; 0 while the file is not started
     trace_level_spec_t *pFirstTraceSpec;  // default anchor, as are the following lists. Global mutex
     trace_level_spec_t *pLastTraceSpec;

@@ -82,6 +82,7 @@ qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages, future_set_loc
     trace_spool_spec_t *spool = head->spool;
     const qn_uint32_t wanted = load_relaxed(spool->pg_size);
     const qn_uint32_t page_size = wanted != 0 ? wanted : head->uRequestedFileSize / pages;
+    if (head->uRequestedTraceSize == 0) head->uRequestedTraceSize = head->uRequestedFileSize;
     head->uRequestedFileSize = round_page_size(page_size, head->pageSize);
     store_relaxed(spool->pg_size, head->uRequestedFileSize);
 
@@ -215,6 +216,8 @@ qn_int32_t become_unbound(trace_anchor_t *anchor)
     anchor->ppActivePg = nullptr;
     anchor->p_head_spool_anchor = nullptr;
     free_pages(anchor, pages);
+    if (anchor->uRequestedTraceSize != 0) anchor->uRequestedFileSize = anchor->uRequestedTraceSize;
+    anchor->uRequestedTraceSize = 0;
     forget_binding(anchor);
     return status;
 }

@@ -128,6 +128,7 @@ TEST_F(PageSet, IsNotMadeUnlessTracesMayHavePages)
     ASSERT_EQ(start_set("t", 3), 0);
     EXPECT_EQ(head->nextPage, nullptr);
     EXPECT_TRUE(exists(folder / "t"));
+    EXPECT_EQ(trace_image::of_file(folder / "t").records_of(16).size(), 1U);
 }
 
 TEST_F(PageSet, IsNotMadeByASpecificationThatIsOff)
@@ -145,6 +146,26 @@ TEST_F(PageSet, IsNotMadeOfNoPages)
     ASSERT_EQ(start_set("t", 0), 0);
     EXPECT_EQ(head->nextPage, nullptr);
     EXPECT_TRUE(exists(folder / "t"));
+}
+
+TEST_F(PageSet, LeavesASingleFileItsStartRecordAndNoState)
+{
+    ASSERT_EQ(start_set("t", 0), 0);
+    EXPECT_EQ(trace_image::of_file(folder / "t").records_of(16).size(), 1U);
+    EXPECT_EQ(trace_image::of_file(folder / "t").u8(192), 0);
+}
+
+TEST_F(PageSet, LeavesASingleFileThatIsContinuedItsStartRecordAndNoState)
+{
+    ASSERT_EQ(start_set("t", 0), 0);
+    stop(head);
+    for (const uint8_t state : {1, 4}) {
+        put<uint8_t>(folder / "t", 192, state);
+        ASSERT_EQ(start(head), 0);
+        EXPECT_EQ(trace_image::of_file(folder / "t").u8(192), 0);
+        stop(head);
+    }
+    EXPECT_EQ(trace_image::of_file(folder / "t").records_of(16).size(), 3U);
 }
 
 struct page_size {

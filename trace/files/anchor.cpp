@@ -72,6 +72,8 @@ namespace qn::tr
 {
 bool spooling_is_on(const trace_anchor_t *anchor) { return anchor->spool != nullptr && anchor->spool->onoff != 0; }
 
+bool is_spooled_page(const trace_anchor_t *anchor) { return spooling_is_on(anchor) && anchor->ppActivePg != nullptr; }
+
 bool is_page_of(const trace_anchor_t *page, const trace_anchor_t *head) { return page->p_head_spool_anchor == head; }
 
 void set_file_name(trace_anchor_t *anchor, const char *file_name) { copy_cut(anchor->fileName, file_name); }

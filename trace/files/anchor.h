@@ -94,6 +94,9 @@ namespace qn::tr
 // True when the anchor's file is governed by a specification that is on.
 bool spooling_is_on(const trace_anchor_t *anchor);
 
+// True for a page of a set whose specification is on. A single file may be governed by one, and stays a single file.
+bool is_spooled_page(const trace_anchor_t *anchor);
+
 // False for a trace file of its own that goes by a page's name.
 bool is_page_of(const trace_anchor_t *page, const trace_anchor_t *head);
 

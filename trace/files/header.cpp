@@ -33,8 +33,8 @@ qn_uint8_t properties_of_this_host()
 
 qn_uint8_t initial_page_state(const trace_anchor_t *anchor)
 {
-    if (!spooling_is_on(anchor)) return 0;
-    const bool active = anchor->ppActivePg != nullptr && *anchor->ppActivePg == anchor;
+    if (!is_spooled_page(anchor)) return 0;
+    const bool active = *anchor->ppActivePg == anchor;
     debug("init_trace_header: setting %s to %s\n", anchor->fileName, active ? "TR_ACTIVE" : "TR_READY");
     return active ? format::page_state::active : format::page_state::ready;
 }

@@ -38,10 +38,10 @@ qn_uint32_t smallest_ring_offset(qn_uint16_t version)
 void refresh_header(trace_anchor_t *anchor, trace_file_header_t *header)
 {
     if (header->uVersion > 4) {
-        if (!spooling_is_on(anchor)) {
+        if (!is_spooled_page(anchor)) {
             header->sp_flags = 0;
         } else if ((header->sp_flags & format::page_state::active) != 0) {
-            if (anchor->ppActivePg != nullptr) *anchor->ppActivePg = anchor;
+            *anchor->ppActivePg = anchor;
             debug("start_trace_page: found active page (%s)\n", anchor->fileName);
         } else {
             header->sp_flags = format::page_state::ready;

@@ -227,7 +227,7 @@ qn_int32_t start_trace_page(trace_anchor_t *anchor)
     debug("baseProgName in header: %s\n", names.base_name);
     log_start(anchor);
 
-    if (!spooling_is_on(anchor)) int_record_start(anchor);
+    if (!is_spooled_page(anchor)) int_record_start(anchor);
     debug("<<start_trace exit for %s\n\n", anchor->fileName);
     start.done();
     return 0;

@@ -166,7 +166,7 @@ qn_int32_t start_trace(trace_anchor_t *anchor)
 
     const qn_int32_t status = start_pages(anchor);
     if (status != 0) return status;
-    if (spooling_is_on(anchor) && anchor->ppActivePg != nullptr) int_record_start(*anchor->ppActivePg);
+    if (is_spooled_page(anchor)) int_record_start(*anchor->ppActivePg);
     // Only this trace's pages: the walk over all traces takes the global mutex, which comes before the anchor set lock.
     if (load_relaxed(memory_is_pinned) != 0 && !master_override_off()) touch_trace(anchor);
     return 0;

@@ -1,9 +1,11 @@
 // A trace that cannot go on: its file is put aside and it starts afresh.
 #include <filesystem>
+#include <thread>
 
 #include <gtest/gtest.h>
 
 #include "files/support_files.h"
+#include "trace/spooling/spool_types.h"
 
 namespace
 {
@@ -103,6 +105,55 @@ TEST_F(TraceToReinitialise, StaysMappedWhileItIsOff)
     EXPECT_EQ(reinit(), 0);
     EXPECT_EQ(anchor->pMap, map);
     EXPECT_TRUE(exists(file + ".save"));
+    EXPECT_FALSE(exists(file));
+}
+
+// A file that a specification has come to govern becomes a page set when it is started next. Look-ups in other threads
+// compare its name meanwhile, under the global mutex.
+class TraceToBecomeAPageSet : public TraceToReinitialise
+{
+protected:
+    void SetUp() override
+    {
+        TraceToReinitialise::SetUp();
+        start_file(file);
+        spool.onoff = 1;
+        spool.pages = 2;
+        spool.pg_size = 65536;
+        anchors.bMultipageEnabled = 1;
+        anchor->spool = &spool;
+        anchor->bSpoolProcessed = 1;
+    }
+    void TearDown() override
+    {
+        TraceToReinitialise::TearDown();
+        anchor->spool = nullptr;
+    }
+
+    trace_spool_spec_t spool{};
+};
+
+TEST_F(TraceToBecomeAPageSet, StaysASingleFileWhileAnotherThreadHoldsTheGlobalMutex)
+{
+    {
+        const qn::tr::global_lock global;
+        std::thread([this] { EXPECT_EQ(reinit(), 0); }).join();
+    }
+    EXPECT_EQ(anchor->fileName, file);
+    EXPECT_EQ(anchor->nextPage, nullptr);
+    EXPECT_EQ(trace_image::of_file(file).records_of(16).size(), 1U);
+    stop(anchor);
+    ASSERT_EQ(start(anchor), 0);
+    EXPECT_EQ(anchor->fileName, file + ".1.sp") << "at the next start";
+}
+
+TEST_F(TraceToBecomeAPageSet, BecomesOneWhenItsFileIsPutAside)
+{
+    EXPECT_EQ(reinit(), 0);
+    EXPECT_EQ(ids_in(file + ".save").size(), 3U);
+    EXPECT_EQ(anchor->fileName, file + ".1.sp");
+    EXPECT_EQ(trace_image::of_file(file + ".1.sp").records_of(16).size(), 1U);
+    EXPECT_TRUE(exists(file + ".2.sp"));
     EXPECT_FALSE(exists(file));
 }
 

@@ -122,12 +122,16 @@ bool may_become_page_set(const trace_anchor_t *anchor)
            (anchor->p_head_spool_anchor == nullptr || anchor->p_head_spool_anchor == anchor);
 }
 
-// The list of specifications is the global mutex's. A writer who starts a damaged trace afresh has only the set lock and
-// must not wait for the other: its trace was bound long ago, and if not, it is bound at its next start.
-void bind_to_specification(trace_anchor_t *anchor)
+// Binds the trace to its specification, and makes a page set of it if that one asks for pages. The list of specifications
+// and the names of traces are the global mutex's. A writer who starts a damaged trace afresh has only the set lock and
+// must not wait for the other: while that is taken, the file stays a single one until its next start.
+qn_int32_t become_page_set_if_asked(trace_anchor_t *anchor, future_set_lock &lock)
 {
     const mutex_try_lock global(anchors.anchorMutex);
-    if (global) process_spool_spec(anchor, anchors.pFirstSpoolSpec);
+    if (!global) return 0;
+    process_spool_spec(anchor, anchors.pFirstSpoolSpec);
+    const qn_uint32_t pages = spooling_is_on(anchor) ? load_relaxed(anchor->spool->pages) : 0;
+    return pages != 0 ? make_page_set(anchor, pages, lock) : 0;
 }
 
 void start_if_on(trace_anchor_t *anchor, qn_int32_t &status)
@@ -156,12 +160,8 @@ qn_int32_t start_trace(trace_anchor_t *anchor)
 
     future_set_lock lock(anchor);
     if (may_become_page_set(anchor)) {
-        bind_to_specification(anchor);
-        const qn_uint32_t pages = spooling_is_on(anchor) ? load_relaxed(anchor->spool->pages) : 0;
-        if (pages != 0) {
-            const qn_int32_t status = make_page_set(anchor, pages, lock);
-            if (status != 0) return status;
-        }
+        const qn_int32_t status = become_page_set_if_asked(anchor, lock);
+        if (status != 0) return status;
     }
 
     const qn_int32_t status = start_pages(anchor);

@@ -104,6 +104,18 @@ TEST_F(DebugLines, AreNotWrittenBelowLevelEight)
     EXPECT_TRUE(system_log().empty());
 }
 
+TEST_F(DebugLines, NameTheWholeBaseOfWhichAHeaderHoldsTheBeginning)
+{
+    calls().proc_args = [](pid_t, char *buffer, size_t) {
+        std::strcpy(buffer, ("/opt/bin/" + std::string(60, 'b')).c_str());
+        return 0;
+    };
+    ASSERT_EQ(start(anchor), 0);
+    EXPECT_TRUE(system_log_has("baseName: " + std::string(60, 'b') + "\n"));
+    EXPECT_TRUE(system_log_has("baseProgName in header: " + std::string(47, 'b') + "\n"));
+    stop(anchor);
+}
+
 TEST_F(DebugLines, NameTheBaseOnlyOfATextWithASlash)
 {
     calls().proc_args = [](pid_t, char *buffer, size_t) {

@@ -157,8 +157,8 @@ program_names names_of_this_program()
     char arguments[512];
     if (cu_get_proc_args_1(getpid(), arguments, sizeof arguments) != 0) return names;
     const char *slash = std::strrchr(arguments, '/');
+    if (slash != nullptr) debug("baseName: %s\n", slash + 1);
     copy_cut(names.base_name, slash != nullptr ? slash + 1 : arguments);
-    if (slash != nullptr) debug("baseName: %s\n", names.base_name);
     copy_cut(names.program, arguments);
     return names;
 }

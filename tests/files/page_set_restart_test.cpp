@@ -17,6 +17,17 @@ protected:
         debug_on();
     }
 
+    // Makes a page of an older format of it: one free record from `ring` on.
+    void age(int number, uint16_t version, uint32_t ring)
+    {
+        std::string image = file_bytes(file(number));
+        std::memcpy(&image[2], &version, sizeof version);
+        std::memcpy(&image[8], &ring, sizeof ring);
+        std::memcpy(&image[44], &ring, sizeof ring);
+        put_record(image, ring, static_cast<uint32_t>(image.size()) - ring, 0, 0);
+        write_file(file(number), image);
+    }
+
     std::string file(int number) const { return page(number)->fileName; }
     uint8_t state(int number) const { return trace_image::of_file(file(number)).u8(192); }
     bool says(int number, const std::string &reason) const
@@ -109,6 +120,27 @@ TEST_F(StoppedPageSet, KeepsTheStateOfAPageOfVersionFour)
     put<uint8_t>(file(2), 192, full);
     ASSERT_EQ(start(head), 0);
     EXPECT_EQ(state(2), full);
+}
+
+// The state of a page is written whatever its version is, and must not lie in the ring.
+TEST_F(StoppedPageSet, InitialisesAPageWhoseRingBeginsBeforeTheEndOfTheState)
+{
+    age(1, 4, 192);
+    age(2, 4, 188);
+    age(3, 3, 180);
+    ASSERT_EQ(start(head), 0);
+    for (int number = 1; number <= 3; ++number) {
+        EXPECT_TRUE(says(number, "corruption 1")) << number;
+        EXPECT_EQ(trace_image::of_file(file(number)).ring_offset(), 200U) << number;
+    }
+}
+
+TEST_F(StoppedPageSet, ContinuesAPageWhoseRingBeginsBehindTheState)
+{
+    age(2, 4, 196);
+    ASSERT_EQ(start(head), 0);
+    EXPECT_EQ(trace_image::of_file(file(2)).ring_offset(), 196U);
+    EXPECT_EQ(trace_image::of_file(file(2)).u16(2), 4);
 }
 
 TEST_F(StoppedPageSet, HasTheFlagsOfEachPageCleared)

@@ -27,10 +27,11 @@ bool belongs_to_another(const trace_anchor_t *anchor, const trace_file_header_t 
            header->uVersion > format::format_version || header->uActualFileSize != anchor->uActualFileSize;
 }
 
-// Older versions have shorter headers. What this library writes into a continued header must end before its ring.
-qn_uint32_t smallest_ring_offset(qn_uint16_t version)
+// Older versions have shorter headers. What this library writes into a continued header must end before its ring: into
+// a page's, of whatever version, its state.
+qn_uint32_t smallest_ring_offset(const trace_anchor_t *anchor, qn_uint16_t version)
 {
-    if (version > 4) return offsetof(trace_file_header_t, tz_offset);
+    if (version > 4 || anchor->ppActivePg != nullptr) return offsetof(trace_file_header_t, tz_offset);
     if (version > 3) return offsetof(trace_file_header_t, sp_reuse_tm);
     return offsetof(trace_file_header_t, uNode_ID);
 }
@@ -67,7 +68,7 @@ public:
     // Null when the ring is sound, else what is wrong with it.
     const char *find_damage()
     {
-        if (ring_start_ < smallest_ring_offset(header_->uVersion) || !has_room_for_record(oldest_))
+        if (ring_start_ < smallest_ring_offset(anchor_, header_->uVersion) || !has_room_for_record(oldest_))
             return "corruption 1";
         qn_uint64_t offset = oldest_;
         for (qn_uint32_t records = 0; records <= size_ / record_header_bytes; ++records) {

@@ -4,8 +4,7 @@
 
 #include <gtest/gtest.h>
 
-#include "files/support_files.h"
-#include "trace/spooling/spool_types.h"
+#include "files/page_set.h"
 
 namespace
 {
@@ -155,6 +154,53 @@ TEST_F(TraceToBecomeAPageSet, BecomesOneWhenItsFileIsPutAside)
     EXPECT_EQ(trace_image::of_file(file + ".1.sp").records_of(16).size(), 1U);
     EXPECT_TRUE(exists(file + ".2.sp"));
     EXPECT_FALSE(exists(file));
+}
+
+// The second of three pages is damaged while it is written; the first is full of records.
+class PageToReinitialise : public PageSet
+{
+protected:
+    void SetUp() override
+    {
+        ASSERT_EQ(program.register_now(), 0);
+        ASSERT_EQ(start_set("t", 3), 0);
+        while (head->pActivePg == head) write_ids(head, 1);
+        write_ids(head, 2);
+        ASSERT_EQ(head->pActivePg, page(2));
+        page(2)->pNextFree->length = 0;
+        first_page = ids_in(folder / "t.1.sp");
+        EXPECT_EQ(tr_ms_record_id_1("TEST", 8, head), 0);
+    }
+
+    client program{"ABCD"};
+    std::vector<uint32_t> first_page;
+};
+
+TEST_F(PageToReinitialise, IsPutAsideAlone)
+{
+    EXPECT_EQ(page(2)->fileName, folder / "t.2.sp");
+    EXPECT_TRUE(exists(folder / "t.2.sp.save"));
+    EXPECT_FALSE(exists(folder / "t.1.sp.save"));
+    EXPECT_FALSE(exists(folder / "t.3.sp.save"));
+    EXPECT_FALSE(std::filesystem::equivalent(folder / "t.2.sp", folder / "t.2.sp.save"));
+}
+
+TEST_F(PageToReinitialise, LeavesTheOtherPagesWhatTheyHold)
+{
+    EXPECT_EQ(ids_in(folder / "t.1.sp"), first_page);
+    EXPECT_EQ(trace_image::of_file(folder / "t.1.sp").records_of(16).size(), 1U) << "the one of the first start";
+    EXPECT_TRUE(trace_image::of_file(folder / "t.3.sp").records().empty());
+}
+
+TEST_F(PageToReinitialise, GoesOnBeingWritten)
+{
+    EXPECT_EQ(head->pActivePg, page(2));
+    const trace_image fresh = trace_image::of_file(folder / "t.2.sp");
+    EXPECT_EQ(fresh.u8(192), 1);
+    ASSERT_EQ(fresh.records().size(), 1U);
+    EXPECT_EQ(fresh.records()[0].function(), 16);
+    write_ids(head, 2);
+    EXPECT_EQ(ids_in(folder / "t.2.sp"), (std::vector<uint32_t>{1, 2}));
 }
 
 class NameOfLength : public TraceToReinitialise, public testing::WithParamInterface<size_t>

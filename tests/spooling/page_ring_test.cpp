@@ -172,6 +172,57 @@ TEST_F(ChangingRing, StaysOnItsActivePageWhateverANewPagesFileSays)
     EXPECT_EQ(page(5)->pMap[192], ready);
 }
 
+// ---- While the trace is stopped.
+
+class StoppedRing : public ChangingRing
+{
+protected:
+    void SetUp() override
+    {
+        ChangingRing::SetUp();
+        while (head->pActivePg != page(3)) ASSERT_EQ(tr_ms_record_id_1("TEST", 1, head), 0);
+        stop(head);
+    }
+    // The trace goes on in that page.
+    void expect_to_be_written_in(int number)
+    {
+        ASSERT_EQ(start(head), 0);
+        EXPECT_EQ(head->pActivePg, page(number));
+        ASSERT_EQ(tr_ms_record_id_1("TEST", 4711, head), 0);
+        EXPECT_EQ(ids_in(page(number)->fileName).back(), 4711U);
+    }
+};
+
+// The head is full.
+TEST_F(StoppedRing, GoesOnBehindItsHeadWhenThePageThatWasWrittenIsCutOff)
+{
+    change_to(2);
+    EXPECT_EQ(obsolete(), names{});
+    expect_to_be_written_in(2);
+}
+
+TEST_F(StoppedRing, GoesOnWhereItWasWhenOtherPagesAreCutOff)
+{
+    change_to(3);
+    EXPECT_EQ(obsolete(), names{});
+    expect_to_be_written_in(3);
+}
+
+TEST_F(StoppedRing, GoesOnWhereItWasWhenItGetsMorePages)
+{
+    change_to(6);
+    EXPECT_EQ(ring().size(), 6U);
+    expect_to_be_written_in(3);
+}
+
+TEST_F(StoppedRing, GoesOnBehindItsHeadWhenThePageThatWasWrittenIsCutOffAndAdded)
+{
+    change_to(2);
+    change_back_to(4);
+    EXPECT_EQ(ring(), (names{"t.1.sp", "t.2.sp", "t.3.sp", "t.4.sp"}));
+    expect_to_be_written_in(2);
+}
+
 struct head_name {
     const char *head;
     const char *added;

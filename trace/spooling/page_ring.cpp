@@ -19,14 +19,16 @@ using namespace qn::tr;
 
 qn_uint8_t state_of(trace_anchor_t *page) { return load_relaxed(header_of(page)->sp_flags); }
 
-// Nothing in the page waits for its copy.
-bool may_be_released(trace_anchor_t *page)
+// Nothing in the page waits for its copy, and nobody writes it.
+bool may_be_released(const trace_anchor_t *head, trace_anchor_t *page)
 {
-    return page->pMap == nullptr || state_of(page) == format::page_state::ready;
+    return page->pMap == nullptr || (state_of(page) == format::page_state::ready && head->pActivePg != page);
 }
 
-void release(trace_anchor_t *page)
+// The page that was written last when the trace was stopped leads to the head, too.
+void release(trace_anchor_t *head, trace_anchor_t *page)
 {
+    if (head->pActivePg == page) head->pActivePg = head;
     stop_trace_page(page, load_relaxed(this_is_child));
     pthread_mutex_destroy(&page->anchorMutex);
     std::free(page);
@@ -56,7 +58,7 @@ void release_obsolete_pages(trace_anchor_t *head, MayGo may_go)
     for (trace_anchor_t *page = take_obsolete_pages(head); page != nullptr;) {
         trace_anchor_t *following = page->next;
         if (may_go(page))
-            release(page);
+            release(head, page);
         else
             make_obsolete(head, page);
         page = following;
@@ -109,8 +111,8 @@ void cut_ring(trace_anchor_t *head, qn_uint32_t pages)
     while (page != head) {
         trace_anchor_t *following = page->nextPage;
         store_relaxed(page->nextPage, nullptr);
-        if (may_be_released(page) && head->pActivePg != page)
-            release(page);
+        if (may_be_released(head, page))
+            release(head, page);
         else
             make_obsolete(head, page);
         page = following;
@@ -183,8 +185,7 @@ namespace qn::tr
 {
 void release_copied_obsolete_pages(trace_anchor_t *anchor)
 {
-    release_obsolete_pages(
-        anchor, [anchor](trace_anchor_t *page) { return may_be_released(page) && anchor->pActivePg != page; });
+    release_obsolete_pages(anchor, [anchor](trace_anchor_t *page) { return may_be_released(anchor, page); });
 }
 
 void release_all_obsolete_pages(trace_anchor_t *anchor)

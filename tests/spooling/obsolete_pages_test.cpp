@@ -1,4 +1,6 @@
 // Pages that are cut off from a ring before they were copied.
+#include <algorithm>
+
 #include <gtest/gtest.h>
 
 #include "spooling/changing_ring.h"
@@ -108,6 +110,25 @@ TEST_F(ChangingRing, TakesAnObsoletePageBack)
     EXPECT_EQ(spq.cnt, 1) << "its copy is still to be made";
 }
 
+TEST_F(ChangingRing, KeepsTheCopyToBeMadeOfAnObsoletePageWhenTheTraceIsStopped)
+{
+    enqueue(4);
+    change_to(2);
+    stop(head);
+    EXPECT_TRUE(is_mapped("t.4.sp"));
+    EXPECT_EQ(spq.cnt, 1);
+}
+
+TEST_F(ChangingRing, LeavesNoPageMappedWhenTracingEnds)
+{
+    enqueue(3);
+    enqueue(4);
+    change_to(2);
+    tr_term();
+    for (const char *name : {"t.1.sp", "t.2.sp", "t.3.sp", "t.4.sp"}) EXPECT_FALSE(is_mapped(name)) << name;
+    EXPECT_EQ(spq.cnt, 0);
+}
+
 // ---- A page that is being written when it is cut off.
 
 class ActivePageCutOff : public ChangingRing
@@ -120,6 +141,18 @@ protected:
         fourth = page(4);
         for (int number = 1; number <= 3; ++number) page(number)->pMap[192] = ready;
         change_to(2);
+    }
+
+    static std::vector<const void *> maps_synced_by(const std::function<void()> &action)
+    {
+        std::vector<const void *> maps;
+        calls().msync = [&](void *map, size_t size, int flags) {
+            maps.push_back(map);
+            return __real_msync(map, size, flags);
+        };
+        action();
+        calls() = {};
+        return maps;
     }
 
     qn_uint32_t last_id = 0;
@@ -150,6 +183,46 @@ TEST_F(ActivePageCutOff, IsNotReleasedWhateverItsStateSays)
     process();
     EXPECT_EQ(obsolete(), names{"t.4.sp"});
     ASSERT_EQ(tr_ms_record_id_1("TEST", 4711, head), 0);
+}
+
+TEST_F(ActivePageCutOff, IsFlushed)
+{
+    const std::vector<const void *> synced = maps_synced_by([] { EXPECT_EQ(tr_flush_1(), 0); });
+    EXPECT_EQ(std::count(synced.begin(), synced.end(), fourth->pMap), 1);
+}
+
+TEST_F(ActivePageCutOff, IsStoppedWithTheTrace)
+{
+    const void *map = fourth->pMap;
+    fourth->pMap[4] = 0xff;
+    const std::vector<const void *> synced = maps_synced_by([this] { stop(head); });
+    EXPECT_EQ(std::count(synced.begin(), synced.end(), map), 1);
+    EXPECT_FALSE(is_mapped("t.4.sp"));
+    EXPECT_EQ(trace_image::of_file(fourth->fileName).u16(4), 0) << "closed in order";
+}
+
+// The head is full.
+TEST_F(ActivePageCutOff, LeadsToThePageBehindTheHeadWhenTheTraceIsStartedAgain)
+{
+    stop(head);
+    ASSERT_EQ(start(head), 0);
+    EXPECT_EQ(head->pActivePg, page(2));
+    ASSERT_EQ(tr_ms_record_id_1("TEST", 4711, head), 0);
+    EXPECT_EQ(ids_in(page(2)->fileName), std::vector<uint32_t>{4711});
+    process();
+    EXPECT_EQ(obsolete(), names{});
+}
+
+TEST_F(ActivePageCutOff, IsTakenBackAfterTheTraceWasStopped)
+{
+    stop(head);
+    change_back_to(4);
+    ASSERT_EQ(start(head), 0);
+    EXPECT_EQ(page(4), fourth);
+    EXPECT_EQ(mappings("t.4.sp"), 1);
+    EXPECT_EQ(obsolete(), names{});
+    ASSERT_EQ(tr_ms_record_id_1("TEST", 4711, head), 0);
+    EXPECT_EQ(ids_in(head->pActivePg->fileName).back(), 4711U);
 }
 
 TEST_F(ActivePageCutOff, IsTakenBackWhileItIsWritten)

@@ -93,12 +93,19 @@ qn_int32_t stop_trace(trace_anchor_t *anchor, int child)
     for_each_page(anchor, [&](trace_anchor_t *page) {
         if (status == 0) status = stop_trace_page(page, child);
     });
+    // A page that was cut off while it was written is in no ring: the next start goes on in the head.
+    trace_anchor_t *active = anchor->pActivePg;
+    if (status == 0 && active != nullptr && active->nextPage == nullptr) {
+        status = stop_trace_page(active, child);
+        anchor->pActivePg = anchor;
+    }
     return status;
 }
 
 void tr_term_file_anchor(trace_anchor_t *anchor)
 {
     stop_trace(anchor, 0);
+    for (trace_anchor_t *page = anchor->p_obsolete_pages; page != nullptr; page = page->next) stop_trace_page(page, 0);
     free_components(anchor);
     free_list(anchor->pFirstTraceSpec, anchor->pLastTraceSpec);
     free_list(anchor->pFirstMapSpec, anchor->pLastMapSpec);

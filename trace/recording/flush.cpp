@@ -21,8 +21,8 @@ constexpr size_t touch_step_bytes = 512;
 
 volatile qn_uint32_t memvar_to_visit; // where the words that were read go, so that they are read
 
-// Calls visit(page) for the pages of every trace file, mapped or not, while it returns 0 and tracing goes on. The last
-// result.
+// Calls visit(anchor, page) for the pages of every trace file, mapped or not, and for those that were cut off from its
+// ring: one of them may be being written. Goes on while visit returns 0 and tracing goes on. The last result.
 template <class Visit>
 int walk_pages(Visit visit)
 {
@@ -34,6 +34,9 @@ int walk_pages(Visit visit)
             result = visit(anchor, page);
             page = page->nextPage;
         } while (result == 0 && !master_override_off() && page != nullptr && page != anchor);
+        page = anchor->p_obsolete_pages;
+        for (; result == 0 && !master_override_off() && page != nullptr; page = page->next)
+            result = visit(anchor, page);
         anchor = load_acquire(anchor->next);
     } while (result == 0 && anchor != nullptr && !master_override_off());
     return result;

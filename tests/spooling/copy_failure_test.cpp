@@ -5,6 +5,8 @@
 
 #include <fcntl.h>
 #include <sys/mount.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <gtest/gtest.h>
 
@@ -203,6 +205,41 @@ TEST_F(FailedCopy, OfADirectoryIsRemoved)
     source = folder.folder();
     EXPECT_EQ(copy_source(), 18);
     EXPECT_EQ(last_error().text, open_failed(EISDIR));
+    expect_nothing_left();
+}
+
+// ---- Pipes: who opens one for reading would wait for a writer.
+
+class CopyOfAPipe : public FailedCopy
+{
+protected:
+    void SetUp() override
+    {
+        FailedCopy::SetUp();
+        ASSERT_EQ(unlink(source.c_str()), 0);
+        ASSERT_EQ(mkfifo(source.c_str(), 0600), 0);
+        calls().open = [this](const char *name, int flags, mode_t mode) {
+            if (name != source || (flags & O_NONBLOCK) != 0) return __real_open(name, flags, mode);
+            ADD_FAILURE() << "this would wait";
+            return fail_with(ENXIO);
+        };
+    }
+};
+
+TEST_F(CopyOfAPipe, IsEmptyWhenNobodyWritesIt)
+{
+    EXPECT_EQ(copy_source(), 0);
+    EXPECT_EQ(file_bytes(dest), "");
+    EXPECT_EQ(open_descriptors(), descriptors);
+}
+
+TEST_F(CopyOfAPipe, IsRemovedWhenItsWriterHasNothingToSay)
+{
+    const int writer = __real_open(source.c_str(), O_RDWR | O_CLOEXEC);
+    ASSERT_NE(writer, -1);
+    EXPECT_EQ(copy_source(), 18);
+    EXPECT_EQ(last_error().text, open_failed(EAGAIN));
+    close(writer);
     expect_nothing_left();
 }
 

@@ -58,9 +58,10 @@ qn_int32_t open_failed(const char *file_name, bool for_writing)
     return set_error_int(QN_TR_EOPEN, 18, errno);
 }
 
+// Nobody is waited for, who might write into a pipe some day: full pages wait for the queue meanwhile.
 qn_int32_t copy_contents(const char *from_name, int to)
 {
-    const descriptor from(qn::platform::open_file(from_name, O_RDONLY));
+    const descriptor from(qn::platform::open_file(from_name, O_RDONLY | O_NONBLOCK));
     if (from.get() == -1) return open_failed(from_name, false);
     const std::unique_ptr<void, releases<std::free>> buffer(std::malloc(copy_chunk_bytes));
     if (buffer == nullptr) return set_error(QN_TR_ENOMEM, 14);

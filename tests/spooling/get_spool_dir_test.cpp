@@ -70,6 +70,13 @@ TEST_F(GetSpoolDir, GivesNothingWhenTheDirectoryCannotBeMade)
     EXPECT_EQ(anchors.pFirstSpoolSpec->onoff, 0);
 }
 
+TEST_F(GetSpoolDir, GivesATreeThatAnotherProcessMakesAtTheSameMoment)
+{
+    configure("a.trc:ON:8:" + x);
+    spool_calls().directory_made = [](const char *path) { std::filesystem::create_directory(path); };
+    EXPECT_EQ(directory_of("/tmp/a.trc"), x + "/" + node_path);
+}
+
 TEST_F(GetSpoolDir, ReadsTheConfigurationOnce)
 {
     configure("a.trc:ON:8:" + x);

@@ -75,6 +75,20 @@ TEST_F(SubDir, IsNotMadeWithoutItsParent)
     EXPECT_FALSE(exists(folder / "missing"));
 }
 
+// Another process makes it between the look and the call.
+TEST_F(SubDir, MayBeMadeByAnotherAtTheSameMoment)
+{
+    spool_calls().directory_made = [](const char *path) { std::filesystem::create_directory(path); };
+    EXPECT_EQ(make(), 0);
+    EXPECT_TRUE(std::filesystem::is_directory(name));
+}
+
+TEST_F(SubDir, MayNotBeAFileThatAnotherMakesAtTheSameMoment)
+{
+    spool_calls().directory_made = [](const char *path) { write_file(path, ""); };
+    EXPECT_EQ(make(), -1);
+}
+
 TEST_F(SubDir, MayNotBeReadOnly)
 {
     expect_in_private_var([] {

@@ -49,6 +49,7 @@ std::string text_of(const char *format, va_list args)
 // The names are the linker's. The fortified build calls the ..._chk forms.
 #pragma GCC visibility push(default)
 extern "C" {
+int __real_mkdir(const char *path, mode_t mode);
 int __real_gethostname(char *name, size_t size);
 int __real_gettimeofday(timeval *time, void *zone);
 int __real_pthread_create(pthread_t *thread, const pthread_attr_t *attributes, void *(*body)(void *), void *argument);
@@ -61,6 +62,12 @@ ssize_t __wrap_read(int fd, void *bytes, size_t count)
     return spool_calls().read ? spool_calls().read(fd, bytes, count) : __real_read(fd, bytes, count);
 }
 ssize_t __wrap___read_chk(int fd, void *bytes, size_t count, size_t) { return __wrap_read(fd, bytes, count); }
+
+int __wrap_mkdir(const char *path, mode_t mode)
+{
+    if (spool_calls().directory_made) spool_calls().directory_made(path);
+    return __real_mkdir(path, mode);
+}
 
 int __wrap_gethostname(char *name, size_t size)
 {

@@ -17,6 +17,7 @@ namespace qn::test
 {
 struct spool_call_hooks {
     std::function<ssize_t(int fd, void *bytes, size_t count)> read;
+    std::function<void(const char *path)> directory_made; // before it is made
     std::function<int(char *name, size_t size)> host_name;
     std::function<int(timeval *)> time_of_day;
     std::function<int(void *(*body)(void *))> thread_start;   // not made when the result is not 0

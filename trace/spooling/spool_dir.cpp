@@ -146,21 +146,23 @@ char *mkspooldir(trace_spool_spec_t *spec, const char *trc_file)
 int subdir(const char *dir)
 {
     debug("subdir checking: '%s'\n", dir);
-    int result = 0;
-    if (access(dir, F_OK) != 0) {
-        result = mkdir(dir, directory_mode);
+    bool is_there = access(dir, F_OK) == 0;
+    if (!is_there) {
+        const int result = mkdir(dir, directory_mode);
+        is_there = result != 0 && errno == EEXIST; // another process, which spools into the same tree, was faster
         // The text is empty exactly when there would be something to tell; whoever reads these lines knows them so.
         debug("subdir creating: '%s' (%d:%s)\n", dir, result, result == 0 ? std::strerror(errno) : "");
-        if (result != 0) return result;
-    } else {
+        if (result != 0 && !is_there) return result;
+    }
+    if (is_there) {
         struct stat status;
         if (access(dir, W_OK) != 0 || stat(dir, &status) != 0 || !S_ISDIR(status.st_mode)) {
             debug("subdir creating: '%s' (%d)\n", dir, 0);
             return -1;
         }
     }
-    debug("subdir returning %d\n", result);
-    return result;
+    debug("subdir returning 0\n");
+    return 0;
 }
 
 int create_all_directories_in_path(const char *p_path)

@@ -77,6 +77,15 @@ TEST_F(GetSpoolDir, GivesATreeThatAnotherProcessMakesAtTheSameMoment)
     EXPECT_EQ(directory_of("/tmp/a.trc"), x + "/" + node_path);
 }
 
+TEST_F(GetSpoolDir, GivesATextThatStaysAsItIs)
+{
+    configure("a.trc:ON:8:" + x);
+    const char *given = tr_get_spool_dir_1("/tmp/a.trc");
+    ASSERT_NE(given, nullptr);
+    turn_spooling_off_in_all_spool_specs();
+    EXPECT_EQ(given, x + "/" + node_path);
+}
+
 TEST_F(GetSpoolDir, ReadsTheConfigurationOnce)
 {
     configure("a.trc:ON:8:" + x);

@@ -160,6 +160,33 @@ TEST_F(ChangingRing, HasNoPageTwiceAfterItWasResized)
     for (const std::string &name : ring()) EXPECT_EQ(mappings(name), 1) << name;
 }
 
+TEST_F(ChangingRing, StaysAsItIsWhenItHasFewerPagesThanItsSpecificationNames)
+{
+    spool.pages = 8;
+    change_to(6);
+    EXPECT_EQ(ring(), (names{"t.1.sp", "t.2.sp", "t.3.sp", "t.4.sp"}));
+    for (const std::string &name : ring()) EXPECT_TRUE(is_mapped(name)) << name;
+}
+
+TEST_F(ChangingRing, LeavesOutANumberWhosePageIsATraceOfItsOwn)
+{
+    trace_anchor_t *other = anchor_for(folder / "t.5.sp");
+    change_to(6);
+    EXPECT_EQ(ring(), (names{"t.1.sp", "t.2.sp", "t.3.sp", "t.4.sp", "t.6.sp"}));
+    EXPECT_EQ(other->pMap, nullptr);
+    EXPECT_EQ(other->nextPage, nullptr);
+    EXPECT_EQ(other->p_head_spool_anchor, nullptr);
+}
+
+TEST_F(ChangingRing, GetsNoPageThatWouldNotHaveANameOfItsOwn)
+{
+    const std::string name = head->fileName;
+    qn::tr::set_file_name(head, ("/" + std::string(4090, 'n')).c_str());
+    EXPECT_EQ(add(6), nullptr);
+    qn::tr::set_file_name(head, name.c_str());
+    EXPECT_EQ(ring(), (names{"t.1.sp", "t.2.sp", "t.3.sp", "t.4.sp"}));
+}
+
 // The file may say that it was being written when a process ended.
 TEST_F(ChangingRing, StaysOnItsActivePageWhateverANewPagesFileSays)
 {

@@ -73,6 +73,28 @@ TEST_F(Reconfigured, ChangesNothingWithoutItsLock)
     });
 }
 
+TEST_F(Reconfigured, ChangesNothingOnceTracingIsStopped)
+{
+    run({"old"}, [] {
+        write_conf(traces({"a"}));
+        global_stop_trace();
+        reconfigure();
+        EXPECT_EQ(list(), patterns{"old"});
+    });
+}
+
+TEST_F(Reconfigured, MayBeBeforeTheFileIsReadForTheFirstTime)
+{
+    expect_in_private_var([] {
+        pthread_once(&trace_global_data_once, initialize_trace_global_data);
+        write_conf(traces({"a", "b"}));
+        reconfigure();
+        char name[4096];
+        ASSERT_EQ(tr_get_filename_1(name), 0);
+        EXPECT_EQ(list(), (patterns{"a", "b"})) << "not read into the list once more";
+    });
+}
+
 TEST_F(Reconfigured, SwitchesEveryPatternThatIsOffOnWithoutCopies)
 {
     run({}, [] {

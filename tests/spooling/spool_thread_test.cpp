@@ -258,4 +258,52 @@ TEST_F(SpoolThread, ReadsTheConfigurationWhenTheClientSaysSo)
         end_thread();
     });
 }
+
+TEST_F(SpoolThread, WaitsForTheIntervalThatItHasJustRead)
+{
+    unsetenv("QN_TR_SPOOL");
+    expect_in_private_var([this] {
+        pthread_once(&sp_read_cfg, [] {});
+        specifications before;
+        before.add("default");
+        install(before);
+        anchors.spool = anchors.pFirstSpoolSpec;
+        ASSERT_EQ(anchors.spool->sync_interval, 60U);
+        qn::tr::set_file_name(&anchors, "/var/default.trc");
+        write_conf(section("traces", {"pat = default"}));
+        const time_t earliest = std::time(nullptr) + 3600;
+        start_thread();
+        wait_for_waits(1);
+        EXPECT_GE(deadline, earliest);
+        end_thread();
+    });
+}
+
+TEST_F(SpoolThread, LooksAtTheConfigurationBetweenTheFilesOfABacklog)
+{
+    unsetenv("QN_TR_SPOOL");
+    expect_in_private_var([this] {
+        pthread_once(&sp_read_cfg, [] {});
+        write_conf(section("traces", {"pat = first"}), 1000);
+        const std::string copies = folder.folder();
+        const std::string files[] = {folder / "f", folder / "g"};
+        for (const std::string &file : files) {
+            write_file(file, "x");
+            spool_enqueue(file.c_str(), copies.c_str(), nullptr, &spq, 0);
+        }
+        std::vector<std::string> patterns; // in force while each is copied
+        calls().open = [&](const char *name, int flags, mode_t mode) {
+            if (name == files[0] || name == files[1]) {
+                patterns.emplace_back(anchors.pFirstSpoolSpec != nullptr ? anchors.pFirstSpoolSpec->pattern : "(none)");
+                write_conf(section("traces", {"pat = second"}), 2000);
+            }
+            return __real_open(name, flags, mode);
+        };
+        start_thread();
+        wait_for_waits(1);
+        end_thread();
+        calls() = {};
+        EXPECT_EQ(patterns, (std::vector<std::string>{"first", "second"}));
+    });
+}
 } // namespace

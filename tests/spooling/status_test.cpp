@@ -1,4 +1,6 @@
 // Which trace files a process has, and where each is spooled.
+#include <atomic>
+#include <cerrno>
 #include <cstring>
 #include <filesystem>
 
@@ -7,6 +9,21 @@
 #include <gtest/gtest.h>
 
 #include "spooling/spool_support.h"
+
+namespace
+{
+std::atomic<pthread_mutex_t *> unlock_that_fails = nullptr;
+} // namespace
+
+// The name is the linker's.
+extern "C" {
+int __real_pthread_mutex_unlock(pthread_mutex_t *mutex);
+[[gnu::visibility("default")]] int __wrap_pthread_mutex_unlock(pthread_mutex_t *mutex)
+{
+    const int result = __real_pthread_mutex_unlock(mutex);
+    return mutex == unlock_that_fails ? EPERM : result;
+}
+}
 
 namespace
 {
@@ -226,6 +243,22 @@ TEST_F(SpoolStatus, IsNotGivenWhenATraceCannotBeLocked)
     EXPECT_TRUE(is_free(anchors.anchorMutex));
     EXPECT_TRUE(
         system_log_has(LOG_WARNING, "get_current_spool_info: failed to get mutex: " + std::to_string(EAGAIN) + "\n"));
+}
+
+TEST_F(SpoolStatus, IsNotGivenWhenATraceCannotBeUnlocked)
+{
+    trace_anchor_t *anchor = anchor_for("/x/a");
+    debug_on();
+    qn_int32_t count = 5;
+    tr_mini_spooling_anchor_t *given = nullptr;
+    unlock_that_fails = &anchor->anchorMutex;
+    EXPECT_EQ(tr_get_current_spooling_status_1(&count, &given), -1);
+    unlock_that_fails = nullptr;
+    EXPECT_EQ(count, 0);
+    EXPECT_EQ(given, nullptr);
+    EXPECT_TRUE(is_free(anchors.anchorMutex));
+    EXPECT_TRUE(system_log_has(LOG_WARNING,
+                               "get_current_spool_info: failed to release mutex: " + std::to_string(EPERM) + "\n"));
 }
 
 // A program that sees this should end: the lock stays held, and the count is that of the records wanted.

@@ -262,6 +262,14 @@ TEST_F(DefaultPageSet, LeavesTheNextNameTheSizeThatWasAskedFor)
     EXPECT_EQ(trace_image::of_file(folder / "g").size(), requested_size);
 }
 
+TEST_F(DefaultPageSet, LeavesTheNextNameTheSizeThatItWasGivenSince)
+{
+    EXPECT_EQ(tr_set_size_1(1048576), 0);
+    anchors.bMultipageEnabled = 0;
+    EXPECT_EQ(tr_set_filename_1((folder / "g").c_str()), 0);
+    EXPECT_EQ(trace_image::of_file(folder / "g").size(), 1048576U);
+}
+
 TEST_F(DefaultPageSet, HasAsManyPagesUnderTheNextName)
 {
     const qn_uint32_t pages = pages_of_implicit_set("g");

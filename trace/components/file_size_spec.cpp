@@ -74,6 +74,7 @@ qn_int32_t tr_set_size_in_anchor(trace_anchor_t *pAnchor, qn_uint32_t newSize)
     {
         const anchor_set_lock set(pAnchor);
         if (!set) return set_error_int(QN_TR_ELOCK, 9, set.result());
+        if (pAnchor->uRequestedTraceSize != 0) pAnchor->uRequestedTraceSize = newSize; // a page set's, as a whole
         if (pAnchor->uRequestedFileSize != newSize)
             for_each_page(pAnchor, [=](trace_anchor_t *page) { set_requested_size(page, newSize); });
         status = restart(pAnchor);

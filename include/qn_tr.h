@@ -34,8 +34,8 @@
  * Start-up    is lazy: the first call that needs the library reads the environment (QN_TR_FILENAME, QN_TR_SIZE,
  *             QN_TR_DEBUG_LEVEL, QN_TR_USE_MSYNC, QN_TR_TRACE_LEVELS, QN_TR_FILE_MAP, QN_TR_FILE_SIZE, QN_TR_SPOOL)
  *             and registers tr_term() with atexit().
- * Files       Nobody may truncate a trace file that a running program traces to: the program's next record there
- *             would end it with SIGBUS. Remove or rename the file instead.
+ * Files       Nobody may truncate a trace file that a running program traces to, or has opened for queries: the
+ *             program's next record or query there would end it with SIGBUS. Remove or rename the file instead.
  *             One process at a time writes a trace file or page set. Two that do it at once overwrite each other's
  *             records, some of them without a trace; neither is harmed otherwise, and the next one that starts the
  *             trace goes on with it. Within a process a file is one trace: one that is to be started while it is in
@@ -309,12 +309,15 @@ QN_EXPORT void tr_term(void);
 /*              identifiers a buffer of four bytes, padded with NULs. It need not be registered.                    */
 /*   traceId    A number that tells the client's trace points apart.                                                */
 /*   fileToken  The trace file, NULL for the default file. The forms without "ms" write to the default file.        */
-/* A writer never tests levels: the client does (QN_TR_IF). It takes the trace file's lock, which other threads hold */
-/* for the time of one record, allocates no memory and makes no system call, unless another process that reads the   */
-/* file asks it to wait (at most 2.5 s). What does not fit into half of the file's ring is cut at the end (strings,   */
-/* values, blocks, formatted text) or dropped (ids, errors); that is never an error, nor is a trace that is not       */
-/* active. Codes common to all: 0; 2 identifier NULL or empty; 9 lock failure. While tracing is stopped every writer  */
-/* returns 0 before it looks at any argument. The error record is never touched.                                     */
+/* A writer never tests levels: the client does (QN_TR_IF). It takes the trace file's lock, which other threads     */
+/* hold for the time of one record, allocates no memory and makes no system call, with two exceptions. Another      */
+/* process that reads the file may ask it to wait: at most 0.5 s, and 2 s for each record that is held while it is  */
+/* to be overwritten. And the record that fills a page of a page set queues that page for its copy: that allocates  */
+/* memory, and waits for the copy of another page. What does not fit into half of the file's ring is cut at the end */
+/* (strings, values, blocks, formatted text) or dropped (ids, errors); that is never an error, nor is a trace that  */
+/* is not active. Codes common to all: 0; 2 identifier NULL or empty; 9 lock failure. While tracing is stopped      */
+/* every writer returns 0 before it looks at any argument. The error record is left alone, unless there is no       */
+/* memory to queue a page (14) or a damaged ring cannot be begun afresh (17 to 23, 35).                             */
 /* ---------------------------------------------------------------------------------------------------------------- */
 
 /* Writes one number: the cheapest record, 32 bytes. */
@@ -430,13 +433,15 @@ QN_EXPORT char *tr_get_spool_dir_1(const char *trc_file);
  * Has the spool thread copy the file file_name into the directory dest, under its base name with the time added; with
  * del 1 the file is removed after that, whether the copy succeeded or not. Both strings must not be NULL; dest must stay
  * valid and unchanged until the copy is done. Returns 0 when the file was queued, or when memory ran out, which the error
- * record tells (14); 1 when a string is NULL. The copy's own result is not reported.
+ * record tells (14); 1 when a string is NULL. The copy's own result is not reported. Once tracing is stopped nothing is
+ * copied any more, and the call returns 0 all the same.
  */
 QN_EXPORT qn_int32_t tr_copy_file_1(const char *dest, const char *file_name, int del);
 
 /*
- * Announces that the program will end by a core event: the next start of the trace file trc_file in this process is
- * marked by a restart record that carries message. Both are copied. Returns 0. Not to be called by two threads at once.
+ * Announces that the program will end by a core event: every start of the trace file trc_file in this process is from
+ * then on marked by a restart record that carries message, until another call takes it back (message NULL). Of a page set
+ * the file is the page that is active then. Both are copied. Returns 0. Not to be called by two threads at once.
  */
 QN_EXPORT qn_int32_t tr_core_event_1(const char *trc_file, const char *message);
 
@@ -445,7 +450,7 @@ QN_EXPORT void tr_configure_1(void);
 
 /* Where one trace file is spooled. */
 typedef struct tr_mini_spooling_anchor {
-    char fileName[1024]; /* the trace file; a page set is followed by " (8 pages)" */
+    char fileName[1024]; /* the trace file; a page set that is configured is followed by " (8 pages)" */
     char dest[1024];     /* the spool directory; "/dev/null": pages are reused uncopied; or "spooling not enabled" */
 } tr_mini_spooling_anchor_t;
 

@@ -74,6 +74,11 @@ bool spooling_is_on(const trace_anchor_t *anchor) { return anchor->spool != null
 
 bool is_spooled_page(const trace_anchor_t *anchor) { return spooling_is_on(anchor) && anchor->ppActivePg != nullptr; }
 
+bool never_wraps(const trace_anchor_t *anchor)
+{
+    return is_spooled_page(anchor) && load_relaxed(anchor->spool->pages) > 1;
+}
+
 bool is_page_of(const trace_anchor_t *page, const trace_anchor_t *head) { return page->p_head_spool_anchor == head; }
 
 void set_file_name(trace_anchor_t *anchor, const char *file_name) { copy_cut(anchor->fileName, file_name); }

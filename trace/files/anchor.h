@@ -97,6 +97,9 @@ bool spooling_is_on(const trace_anchor_t *anchor);
 // True for a page of a set whose specification is on. A single file may be governed by one, and stays a single file.
 bool is_spooled_page(const trace_anchor_t *anchor);
 
+// True for one of several such pages: its ring never wraps, the next page follows it.
+bool never_wraps(const trace_anchor_t *anchor);
+
 // False for a trace file of its own that goes by a page's name.
 bool is_page_of(const trace_anchor_t *page, const trace_anchor_t *head);
 

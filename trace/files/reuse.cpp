@@ -6,7 +6,6 @@
 
 #include "trace/files/debug.h"
 #include "trace/files/trace_file.h"
-#include "trace/spooling/spool_types.h"
 
 namespace
 {
@@ -126,11 +125,6 @@ private:
     bool ends_in_record_ = false; // the last bytes of the file are not free
 };
 
-bool is_page_of_set(const trace_anchor_t *anchor)
-{
-    return spooling_is_on(anchor) && load_relaxed(anchor->spool->pages) > 1 && anchor->ppActivePg != nullptr;
-}
-
 bool refuse(const trace_anchor_t *anchor, const char *reason)
 {
     debug("\ttrace: reInit for %s due to %s\n", anchor->fileName, reason);
@@ -154,7 +148,7 @@ bool reuse_ring(trace_anchor_t *anchor, const program_names &names)
     anchor->seqNumber = walk.last_sequence();
     anchor->pWrap = anchor->pRing = record_at(anchor, walk.ring_start());
     // A page never wraps: when it is full, its contents stay for the spool thread, and the next record switches pages.
-    const bool is_full = is_page_of_set(anchor) && walk.is_filled_exactly();
+    const bool is_full = never_wraps(anchor) && walk.is_filled_exactly();
     anchor->pNextFree = record_at(anchor, is_full ? anchor->uActualFileSize : walk.free_offset());
     debug("\ttrace: Re-using existing file.\n");
     return true;

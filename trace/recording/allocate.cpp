@@ -27,17 +27,10 @@ constexpr auto free_space = static_cast<qn_uint16_t>(format::kind::free_space);
 constexpr auto being_written = static_cast<qn_uint16_t>(format::kind::being_written);
 constexpr auto start_kind = static_cast<qn_uint16_t>(format::kind::start);
 
-// A trace of several pages never wraps inside a page. One that was started as a single file stays one.
-bool is_multipage(const trace_anchor_t *anchor)
-{
-    return anchor->spool != nullptr && anchor->spool->onoff != 0 && load_relaxed(anchor->spool->pages) > 1 &&
-           anchor->ppActivePg != nullptr;
-}
-
 // The longest span that one record can have: the whole ring, or a whole page that does not begin with a notice.
 qn_uint64_t longest_span(const trace_anchor_t *anchor)
 {
-    trace_record_header_t *first = is_multipage(anchor) ? anchor->pRing : anchor->pWrap;
+    trace_record_header_t *first = never_wraps(anchor) ? anchor->pRing : anchor->pWrap;
     return static_cast<qn_uint64_t>(anchor->pMapEnd - address(first));
 }
 
@@ -219,7 +212,7 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
         next = record_of(behind_next);
         if (__builtin_expect(behind_next == end, 0)) {
             if (wrapped) return give_up(pAnchor, "opal_trace: allocate_space allocation loop overwrap\n");
-            if (is_multipage(pAnchor)) return go_on_in_next_page(pAnchor, pReqLength);
+            if (never_wraps(pAnchor)) return go_on_in_next_page(pAnchor, pReqLength);
             wrapped = true;
             wrap_round(pAnchor, static_cast<qn_uint32_t>(consumed));
             next = pAnchor->pNextFree;
@@ -239,13 +232,13 @@ trace_record_header_t *allocate_space_page(trace_anchor_t *pAnchor, unsigned int
         record = pAnchor->pNextFree;
         unsigned char *next_free = cut_record(pAnchor, record, static_cast<qn_uint32_t>(consumed), requested);
         move_free_pointer(pAnchor, next_free, oldest_offset(pAnchor, next_free));
-    } else if (is_multipage(pAnchor)) {
+    } else if (never_wraps(pAnchor)) {
         return pageFull(pAnchor, pReqLength);
     } else {
         record = claim_before_start(pAnchor, static_cast<qn_uint32_t>(consumed), requested);
     }
     // The record ends where the file ends: a single file goes on at the start of the ring, a page is full.
-    if (address(pAnchor->pNextFree) == end && !is_multipage(pAnchor)) pAnchor->pNextFree = pAnchor->pWrap;
+    if (address(pAnchor->pNextFree) == end && !never_wraps(pAnchor)) pAnchor->pNextFree = pAnchor->pWrap;
     stamp(record);
     if (__builtin_expect(start != nullptr, 0)) keep_in_header(header, overwritten);
     return record;

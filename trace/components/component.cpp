@@ -34,13 +34,6 @@ void unlink_component(component_anchor_t *component)
     if (*link != nullptr) *link = component->pNext;
 }
 
-bool lacks_mapped_file(const component_anchor_t *component)
-{
-    for (int i = 0; i < component->numberOfCategories; ++i)
-        if (component->pMappedBy[i] != nullptr && load_relaxed(component->pFileTokens[i]) == nullptr) return true;
-    return false;
-}
-
 bool any_category_traces()
 {
     const mutex_lock list(component_list_mutex);

@@ -38,10 +38,6 @@ void free_component(component_anchor_t *component);
 // Takes a component out of the list, if it is there. Global mutex.
 void unlink_component(component_anchor_t *component);
 
-// True when memory ran out for a trace file that a category is mapped to: its token is that of the default file. Global
-// mutex.
-bool lacks_mapped_file(const component_anchor_t *component);
-
 // True when any category of any component has a level above 0.
 bool any_category_traces();
 } // namespace qn::tr

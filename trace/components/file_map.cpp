@@ -102,10 +102,13 @@ int parse_map_spec(const char *pString, trace_map_spec_t **pFirstMapSpec, trace_
 
 int process_map_spec(trace_anchor_t *pAnchor, trace_map_spec_t *pMapSpec, component_anchor_t *pTgtComp)
 {
+    pMapSpec->lacks_file = false;
     // By position, where levels go by category_id.
     const bool compiled = for_each_match(pAnchor, pMapSpec, pTgtComp, [=](component_anchor_t *component, int entry) {
         component->pMappedBy[entry] = pMapSpec;
-        store_relaxed(component->pFileTokens[entry], findOrCreateAnchorForFile(pMapSpec->fileName, 1));
+        trace_anchor_t *anchor = findOrCreateAnchorForFile(pMapSpec->fileName, 1);
+        if (anchor == nullptr) pMapSpec->lacks_file = true;
+        store_relaxed(component->pFileTokens[entry], anchor);
     });
     pMapSpec->matched = compiled && (pMapSpec->matched || pTgtComp == nullptr);
     return 0;
@@ -117,12 +120,16 @@ namespace
 // matched it. Matching all of them again at every call would make a map that is given in many calls a matter of minutes.
 void apply_matched_elements()
 {
-    for (trace_map_spec_t *spec = anchors.pFirstMapSpec; spec != nullptr; spec = spec->pNext) spec->anchor_p = nullptr;
+    for (trace_map_spec_t *spec = anchors.pFirstMapSpec; spec != nullptr; spec = spec->pNext) {
+        spec->anchor_p = nullptr;
+        spec->lacks_file = false;
+    }
     for (component_anchor_t *component = anchors.pFirstComp; component != nullptr; component = component->pNext) {
         for (int i = 0; i < component->numberOfCategories; ++i) {
             trace_map_spec_t *spec = component->pMappedBy[i];
             if (spec == nullptr) continue;
             if (spec->anchor_p == nullptr) spec->anchor_p = findOrCreateAnchorForFile(spec->fileName, 1);
+            spec->lacks_file = spec->anchor_p == nullptr;
             store_relaxed(component->pFileTokens[i], spec->anchor_p);
         }
     }
@@ -136,15 +143,14 @@ void apply_file_map()
     while (spec != nullptr && spec->matched) spec = spec->pNext;
     for (; spec != nullptr; spec = spec->pNext) process_map_spec(&anchors, spec, nullptr);
 }
-
-// 0, or 14 after recording it when memory ran out for a file. The next call looks that one up again.
-qn_int32_t check_mapped_files()
-{
-    const component_anchor_t *component = anchors.pFirstComp;
-    while (component != nullptr && !lacks_mapped_file(component)) component = component->pNext;
-    return component != nullptr ? set_error(QN_TR_ENOMEM, 14) : 0;
-}
 } // namespace
+
+qn_int32_t qn::tr::check_mapped_files()
+{
+    const trace_map_spec_t *spec = anchors.pFirstMapSpec;
+    while (spec != nullptr && !spec->lacks_file) spec = spec->pNext;
+    return spec != nullptr ? set_error(QN_TR_ENOMEM, 14) : 0;
+}
 
 qn_int32_t tr_set_file_map_1(const char *fileName, const char *selectString)
 {

@@ -166,7 +166,7 @@ qn_int32_t tr_ms_register_component_1(const qn_char_t *pComponentId, tr_detail_l
         link_component(component);
         apply_specifications(component);
         status = start_traces_that_are_on();
-        if (status == 0 && lacks_mapped_file(component)) status = set_error(QN_TR_ENOMEM, 14);
+        if (status == 0) status = check_mapped_files();
         in_progress.done();
     }
     return status != 0 ? status : cu_set_no_error_1();

@@ -23,7 +23,8 @@ struct trace_map_spec {
     char *pCategory;
     trace_anchor_t *anchor_p; // not set by the parser: the file is looked up each time the node is applied
     char fileName[trace_file_name_bytes];
-    bool matched; // with every component that there is; one that registers is matched with all elements
+    bool matched;    // with every component that there is; one that registers is matched with all elements
+    bool lacks_file; // memory ran out for it when the node was applied last: its categories have the default file
 };
 
 // Appends the elements of a level specification to a list; on an error the list is as before.
@@ -44,6 +45,12 @@ int process_trace_spec(trace_anchor_t *pAnchor, trace_level_spec_t *pTraceSpec, 
 // The same two for a file map.
 int parse_map_spec(const char *pString, trace_map_spec_t **pFirstMapSpec, trace_map_spec_t **pLastMapSpec);
 int process_map_spec(trace_anchor_t *pAnchor, trace_map_spec_t *pMapSpec, component_anchor_t *pTgtComp);
+
+namespace qn::tr
+{
+// 0, or 14 after recording it when memory ran out for a file of the map. The next call looks that one up again.
+qn_int32_t check_mapped_files();
+} // namespace qn::tr
 
 // Reads one file name, quoted or not, and the separators behind it; where the text goes on.
 const char *parseFileName(const char *source, const char *lastPos, char *fileName, int len);

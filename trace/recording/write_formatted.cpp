@@ -58,8 +58,8 @@ namespace
 const bool ms_formatted_are_own = tr_ms_record_vfmt_string_1 == own_ms_vfmt_string;
 const bool formatted_are_own = ms_formatted_are_own && tr_record_vfmt_string_1 == own_vfmt_string;
 
-[[gnu::always_inline]] inline qn_int32_t record_formatted(const qn_char_t *comp_id, qn_uint32_t trace_id,
-                                                          const char *format, va_list args)
+[[gnu::always_inline, gnu::format(printf, 3, 0)]] inline qn_int32_t
+record_formatted(const qn_char_t *comp_id, qn_uint32_t trace_id, const char *format, va_list args)
 {
     return __builtin_expect(formatted_are_own, 1)
                ? write_record_by<formatted_writer>(comp_id, nullptr, trace_id, format, args)

@@ -128,6 +128,14 @@ namespace
 {
 const bool ms_data_are_own = tr_ms_record_data_v_1 == own_ms_data_v;
 const bool data_are_own = ms_data_are_own && tr_record_data_v_1 == own_data_v;
+
+// What the forwarding comes to while the names are own.
+[[gnu::always_inline]] inline qn_int32_t record_data(const qn_char_t *comp_id, qn_uint32_t trace_id,
+                                                     tr_file_token_t token, qn_uint32_t count, va_list args)
+{
+    return __builtin_expect(count == 1, 1) ? write_record_by<block_writer>(comp_id, token, trace_id, args)
+                                           : own_ms_data_v(comp_id, trace_id, token, count, args);
+}
 } // namespace
 
 qn_int32_t tr_ms_record_data_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
@@ -146,8 +154,8 @@ qn_int32_t tr_ms_record_data_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr
 {
     va_list args;
     va_start(args, blkCount);
-    const qn_int32_t status = __builtin_expect(ms_data_are_own && blkCount == 1, 1)
-                                  ? write_record_by<block_writer>(pCompId, fileToken, traceId, args)
+    const qn_int32_t status = __builtin_expect(ms_data_are_own, 1)
+                                  ? record_data(pCompId, traceId, fileToken, blkCount, args)
                                   : tr_ms_record_data_v_1(pCompId, traceId, fileToken, blkCount, args);
     va_end(args);
     return status;
@@ -157,9 +165,8 @@ qn_int32_t tr_record_data_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn_ui
 {
     va_list args;
     va_start(args, blkCount);
-    const qn_int32_t status = __builtin_expect(data_are_own && blkCount == 1, 1)
-                                  ? write_record_by<block_writer>(pCompId, nullptr, traceId, args)
-                                  : tr_record_data_v_1(pCompId, traceId, blkCount, args);
+    const qn_int32_t status = __builtin_expect(data_are_own, 1) ? record_data(pCompId, traceId, nullptr, blkCount, args)
+                                                                : tr_record_data_v_1(pCompId, traceId, blkCount, args);
     va_end(args);
     return status;
 }

@@ -83,6 +83,15 @@ namespace
 const bool ms_lists_are_own = tr_ms_record_strings_v_1 == own_ms_strings_v;
 const bool lists_are_own = ms_lists_are_own && tr_record_strings_v_1 == own_strings_v;
 const bool strings_are_own = lists_are_own && tr_record_strings_1 == own_strings;
+
+// What the forwarding comes to while the names are own.
+[[gnu::always_inline]] inline qn_int32_t record_strings(const qn_char_t *comp_id, qn_uint32_t trace_id,
+                                                        tr_file_token_t token, qn_uint32_t number, va_list args)
+{
+    return __builtin_expect(number == 1, 1)
+               ? write_record_by<string_writer>(comp_id, token, trace_id, va_arg(args, const char *))
+               : own_ms_strings_v(comp_id, trace_id, token, number, args);
+}
 } // namespace
 
 qn_int32_t tr_ms_record_strings_v_1(const qn_char_t *pCompId, qn_uint32_t traceId, tr_file_token_t fileToken,
@@ -101,10 +110,9 @@ qn_int32_t tr_ms_record_strings_1(const qn_char_t *pCompId, qn_uint32_t traceId,
 {
     va_list args;
     va_start(args, numStrings);
-    const qn_int32_t status =
-        __builtin_expect(ms_lists_are_own && numStrings == 1, 1)
-            ? write_record_by<string_writer>(pCompId, fileToken, traceId, va_arg(args, const char *))
-            : tr_ms_record_strings_v_1(pCompId, traceId, fileToken, numStrings, args);
+    const qn_int32_t status = __builtin_expect(ms_lists_are_own, 1)
+                                  ? record_strings(pCompId, traceId, fileToken, numStrings, args)
+                                  : tr_ms_record_strings_v_1(pCompId, traceId, fileToken, numStrings, args);
     va_end(args);
     return status;
 }
@@ -113,10 +121,9 @@ qn_int32_t tr_record_strings_1(const qn_char_t *pCompId, qn_uint32_t traceId, qn
 {
     va_list args;
     va_start(args, numStrings);
-    const qn_int32_t status =
-        __builtin_expect(lists_are_own && numStrings == 1, 1)
-            ? write_record_by<string_writer>(pCompId, nullptr, traceId, va_arg(args, const char *))
-            : tr_record_strings_v_1(pCompId, traceId, numStrings, args);
+    const qn_int32_t status = __builtin_expect(lists_are_own, 1)
+                                  ? record_strings(pCompId, traceId, nullptr, numStrings, args)
+                                  : tr_record_strings_v_1(pCompId, traceId, numStrings, args);
     va_end(args);
     return status;
 }

@@ -292,6 +292,19 @@ TEST_F(DefaultPageSet, LeadsAForkedChildToNoFreedPage)
     EXPECT_EQ(children, 1);
 }
 
+TEST_F(DefaultPageSet, LeadsAForkedChildToNoPageThatWasHalfTakenFromTheQueue)
+{
+    ASSERT_EQ(pthread_mutex_lock(&spq.mutex), 0);
+    sp_q_element_t half{};
+    half.pAnchor = &anchors;
+    spq.pFirst = &half; // and the last one is gone
+    spq.cnt = 1;
+    EXPECT_TRUE(in_child([] { return tr_set_filename_1(nullptr) == 0; }));
+    spq.pFirst = nullptr;
+    spq.cnt = 0;
+    pthread_mutex_unlock(&spq.mutex);
+}
+
 TEST_F(DefaultPageSet, StopsWholeForANullPointer)
 {
     const trace_anchor_t *second = anchors.nextPage;

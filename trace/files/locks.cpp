@@ -68,6 +68,9 @@ void reset_locks_in_child()
     init_recursive_mutex(&component_list_mutex);
     init_recursive_mutex(&cluster_info_mutex);
     pthread_cond_init(&spq.cond, nullptr);
+    // The queue may be between two stores of a thread that does not exist here. Nor does the one that copies.
+    spq.pFirst = spq.pLast = nullptr;
+    spq.cnt = 0;
     for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = anchor->next) {
         if (anchor->pSpoolMutex != nullptr) init_recursive_mutex(anchor->pSpoolMutex);
         for_each_page(anchor, [](trace_anchor_t *page) {

@@ -263,6 +263,7 @@ private:
     std::optional<mutex_lock> lock_;
 };
 
-// Makes every lock free again in a forked child, where the threads that held them do not exist.
+// Makes every lock free again in a forked child, where the threads that held them do not exist, and empties the spool
+// queue.
 void reset_locks_in_child();
 } // namespace qn::tr

@@ -23,8 +23,8 @@ inline trace_anchor_t *make_page_set(const std::string &name, qn_uint32_t count,
     head->spool->pages = count;
     head->spool->pg_size = page_size;
     head->spool->onoff = 1;
-    head->pSpoolMutex = static_cast<pthread_mutex_t *>(std::malloc(sizeof(pthread_mutex_t)));
-    init_recursive_mutex(head->pSpoolMutex);
+    head->pSpoolMutex = static_cast<pthread_mutex_t *>(std::malloc(sizeof(qn::tr::biased_mutex)));
+    init_biased_mutex(head->pSpoolMutex);
     head->uRequestedFileSize = page_size;
     head->bSpoolProcessed = 1;
     head->nextPage = head;

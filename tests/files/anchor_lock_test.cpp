@@ -75,7 +75,7 @@ class AnchorSet : public testing::Test
 protected:
     void SetUp() override
     {
-        init_recursive_mutex(&shared);
+        init_biased_mutex(&shared);
         head = anchor_for("/tmp/t.1.sp");
         head->spool = &spool;
         head->pSpoolMutex = &shared;
@@ -87,7 +87,8 @@ protected:
     }
 
     trace_spool_spec_t spool{};
-    pthread_mutex_t shared;
+    qn::tr::biased_mutex shared_lock;
+    pthread_mutex_t &shared = shared_lock.mutex;
     trace_anchor_t *head = nullptr;
     trace_anchor_t *page = nullptr;
 };

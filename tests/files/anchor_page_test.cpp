@@ -61,7 +61,7 @@ class PageAnchor : public testing::Test
 protected:
     void SetUp() override
     {
-        init_recursive_mutex(&shared);
+        init_biased_mutex(&shared);
         head = anchor_for("/tmp/t.1.sp");
         head->uMaxSize = 4711 & ~3;
         head->pageSize = 16384;
@@ -79,7 +79,8 @@ protected:
     }
 
     trace_spool_spec_t spool{};
-    pthread_mutex_t shared;
+    qn::tr::biased_mutex shared_lock;
+    pthread_mutex_t &shared = shared_lock.mutex;
     trace_anchor_t *head = nullptr;
     trace_anchor_t *page = nullptr; // one that the test has made
 };

@@ -50,29 +50,41 @@ std::vector<scene> scenes()
     };
 }
 
-class KilledWriter : public testing::TestWithParam<scene>
+enum class locked { by_mutex, by_bias };
+
+class KilledWriter : public testing::TestWithParam<std::tuple<scene, locked>>
 {
 protected:
+    static const scene &tested() { return std::get<scene>(GetParam()); }
+
     // In the writing process.
     void prepare() const
     {
         setenv("QN_TR_SIZE", std::to_string(file_bytes).c_str(), 1);
         client component("TEST");
         if ((tr_set_filename_1(file_.c_str()) | component.register_now()) != 0) std::abort();
+        if (std::get<locked>(GetParam()) == locked::by_bias) become_biased();
         std::vector<planned_record> ring;
-        const auto count = static_cast<uint32_t>(GetParam().lengths.size());
+        const auto count = static_cast<uint32_t>(tested().lengths.size());
         for (uint32_t i = 0; i < count; ++i) {
-            const auto age = static_cast<uint32_t>((i + count - GetParam().oldest) % count);
-            ring.push_back({GetParam().lengths[i], 1, 100 + 2 * age});
+            const auto age = static_cast<uint32_t>((i + count - tested().oldest) % count);
+            ring.push_back({tested().lengths[i], 1, 100 + 2 * age});
         }
-        lay_out(ring, GetParam().oldest, 100 + 2 * (count - 1));
+        lay_out(ring, tested().oldest, 100 + 2 * (count - 1));
+    }
+
+    static void become_biased()
+    {
+        for (qn_uint32_t i = 0; i < 300; ++i)
+            if (write_32_bytes() != 0) std::abort();
+        if (anchors.anchorBias.towards == nullptr) std::abort();
     }
 
     // The file behind each instruction that changed it; the first and the last are those before and after the call.
     void step_through()
     {
         std::optional<tail_reader> file;
-        const stepped seen = single_step([this] { prepare(); }, GetParam().call,
+        const stepped seen = single_step([this] { prepare(); }, tested().call,
                                          [&] { images_.emplace_back(file.emplace(file_).bytes()); },
                                          [&] {
                                              if (file->bytes() != images_.back()) images_.emplace_back(file->bytes());
@@ -100,8 +112,18 @@ protected:
 };
 } // namespace
 
-INSTANTIATE_TEST_SUITE_P(AtAnyInstruction, KilledWriter, testing::ValuesIn(scenes()),
-                         [](const auto &info) { return std::string(info.param.name); });
+std::string name_of(const testing::TestParamInfo<std::tuple<scene, locked>> &info)
+{
+    const bool biased = std::get<locked>(info.param) == locked::by_bias;
+    return std::string(std::get<scene>(info.param).name) + (biased ? "ByBias" : "");
+}
+
+#ifdef __SANITIZE_THREAD__
+const auto ways = testing::Values(locked::by_mutex);
+#else
+const auto ways = testing::Values(locked::by_mutex, locked::by_bias);
+#endif
+INSTANTIATE_TEST_SUITE_P(AtAnyInstruction, KilledWriter, testing::Combine(testing::ValuesIn(scenes()), ways), name_of);
 
 TEST_P(KilledWriter, LeavesASoundRing)
 {

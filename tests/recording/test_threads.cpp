@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <sched.h>
 #include <thread>
+#include <unistd.h>
 
 #include <gtest/gtest.h>
 
@@ -130,6 +131,27 @@ TEST(WritersOfOneFile, KeepTheSmallestRingSound)
     ASSERT_FALSE(numbers.empty());
     for (const auto &[author, of_author] : numbers) expect_the_last_of(of_author);
 }
+
+#ifndef __SANITIZE_THREAD__ // no lock is biased there
+TEST(WritersOfOneFile, LoseNothingWhileTheLocksBiasChangesHands)
+{
+    const one_trace trace(roomy_file);
+    uint32_t revoked = 0;
+    {
+        const meanwhile revoking([&] {
+            usleep(10);
+            revoked += qn::tr::load_relaxed(anchors.anchorBias.towards) != nullptr ? 1 : 0;
+            const qn::tr::anchor_set_lock set(&anchors);
+            anchors.anchorBias.enough = 4; // soon biased anew, towards another
+        });
+        in_threads(writers, [](uint32_t thread) { write_all(thread); });
+        revoking.wait_for_turns(20);
+    }
+    const auto numbers = numbers_in(trace.image().ring());
+    for (uint32_t thread = 0; thread < writers; ++thread) expect_all_of(thread, numbers);
+    EXPECT_GT(revoked, 10U);
+}
+#endif
 
 TEST(WritersOfSeveralFiles, LoseNothingWhileOthersRegisterAndRename)
 {

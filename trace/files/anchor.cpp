@@ -64,7 +64,7 @@ void initAnchor(trace_anchor_t *anchor)
     anchor->p_head_spool_anchor = nullptr;
     anchor->p_obsolete_pages = nullptr;
     anchor->p_obsolete_pages_tail = nullptr;
-    if (anchor != &anchors) init_recursive_mutex(&anchor->anchorMutex);
+    if (anchor != &anchors) init_biased_mutex(&anchor->anchorMutex);
     anchor->pageSize = static_cast<qn_int32_t>(sysconf(_SC_PAGESIZE));
 }
 

@@ -14,6 +14,7 @@
 #include <qn_tr.h>
 
 #include "trace/files/format.h"
+#include "trace/files/lock_bias.h"
 
 typedef struct trace_anchor trace_anchor_t;
 typedef struct component_anchor component_anchor_t;
@@ -28,7 +29,8 @@ inline constexpr qn_uint32_t default_file_size = 65536;
 struct trace_anchor {
     // What every record touches: two cache lines.
     pthread_mutex_t anchorMutex;  // recursive; the default anchor's is the global mutex
-    pthread_mutex_t *pSpoolMutex; // recursive, shared by the page set and owned by its head; null: a single file
+    qn::tr::lock_bias anchorBias; // of that mutex: the two are a biased_mutex
+    pthread_mutex_t *pSpoolMutex; // recursive, a biased_mutex; shared by the page set, its head's; null: a single file
     unsigned char *pMap;          // the file header; null while the file is not mapped
     trace_record_header_t *pNextFree;
     unsigned char *pMapEnd;      // one past the mapping
@@ -69,6 +71,9 @@ struct trace_anchor {
     trace_anchor_t *p_obsolete_pages; // head: pages cut off and not yet copied
     trace_anchor_t *p_obsolete_pages_tail;
 };
+
+static_assert(offsetof(trace_anchor, anchorMutex) == 0 &&
+              offsetof(trace_anchor, anchorBias) == sizeof(pthread_mutex_t));
 
 extern trace_anchor_t anchors;
 

@@ -68,8 +68,13 @@ void be_usable_in_child()
     if (!anchors.bInitialized) forget_spool_thread();
 }
 
-// Some calls take locks without initialising the library. So this handler is there from the start.
-[[gnu::constructor]] void handle_every_fork() { pthread_atfork(nullptr, nullptr, be_usable_in_child); }
+// Some calls take locks without initialising the library. So this handler is there from the start, and so are biased
+// locks: to a process that has several threads already, the system needs some 20 ms to promise its barrier.
+[[gnu::constructor]] void prepare_locks()
+{
+    pthread_atfork(nullptr, nullptr, be_usable_in_child);
+    allow_bias();
+}
 } // namespace
 
 int init(trace_anchor_t *anchor)

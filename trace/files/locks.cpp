@@ -15,7 +15,13 @@ void init_recursive_mutex(pthread_mutex_t *mutex)
     pthread_mutexattr_destroy(&attributes);
 }
 
-int lockGlobalMutex(void) { return qn::tr::lock_mutex(&anchors.anchorMutex); }
+void init_biased_mutex(pthread_mutex_t *mutex)
+{
+    init_recursive_mutex(mutex);
+    qn::tr::bias_of(mutex) = {};
+}
+
+int lockGlobalMutex(void) { return qn::tr::lock_mutex(&anchors.anchorMutex, qn::tr::lock_rank::global); }
 
 int unlockGlobalMutex(void) { return qn::tr::unlock_mutex(&anchors.anchorMutex); }
 
@@ -53,9 +59,7 @@ int lock_busy_mutex(pthread_mutex_t *mutex, int result_of_try)
 pthread_mutex_t *take_anchor_set(trace_anchor_t *anchor, int &result)
 {
     for (;;) {
-        pthread_mutex_t *mutex = anchor_set_mutex(anchor);
-        const lock_rank rank = mutex == &anchor->anchorMutex ? lock_rank::file : lock_rank::set;
-        pthread_mutex_t *taken = take_if_right(anchor, mutex, rank, result);
+        pthread_mutex_t *taken = take_if_right(anchor, anchor_set_mutex(anchor), result);
         if (taken != nullptr || result != 0) return taken;
     }
 }
@@ -63,8 +67,9 @@ pthread_mutex_t *take_anchor_set(trace_anchor_t *anchor, int &result)
 void reset_locks_in_child()
 {
     forget_all_taken();
+    forget_biased_threads();
     initialize_trace_global_data();
-    init_recursive_mutex(&anchors.anchorMutex);
+    init_biased_mutex(&anchors.anchorMutex);
     init_recursive_mutex(&component_list_mutex);
     init_recursive_mutex(&cluster_info_mutex);
     pthread_cond_init(&spq.cond, nullptr);
@@ -72,9 +77,9 @@ void reset_locks_in_child()
     spq.pFirst = spq.pLast = nullptr;
     spq.cnt = 0;
     for (trace_anchor_t *anchor = &anchors; anchor != nullptr; anchor = anchor->next) {
-        if (anchor->pSpoolMutex != nullptr) init_recursive_mutex(anchor->pSpoolMutex);
+        if (anchor->pSpoolMutex != nullptr) init_biased_mutex(anchor->pSpoolMutex);
         for_each_page(anchor, [](trace_anchor_t *page) {
-            if (page != &anchors) init_recursive_mutex(&page->anchorMutex);
+            if (page != &anchors) init_biased_mutex(&page->anchorMutex);
         });
     }
 }

@@ -26,12 +26,16 @@
 #include <pthread.h>
 
 #include "trace/files/anchor.h"
+#include "trace/files/lock_bias.h"
 #include "trace/files/lock_ranks.h"
 #include "trace/files/shared_words.h"
 #include "trace/spooling/spool_types.h"
 
 // Makes a recursive mutex.
 void init_recursive_mutex(pthread_mutex_t *mutex);
+
+// The same for an anchor's or a page set's, which is part of a biased_mutex: it is biased towards nobody.
+void init_biased_mutex(pthread_mutex_t *mutex);
 
 // The global mutex; the lock's result, 0 on success.
 int lockGlobalMutex(void);
@@ -83,19 +87,38 @@ private:
 // Whether the caller interrupts the library on its own thread.
 inline bool interrupts_a_guard() { return guards_of_thread != 0; }
 
+// The locks under which records are written may be biased towards a thread.
+constexpr bool may_be_biased(lock_rank rank) { return rank <= lock_rank::set; }
+
+// Takes such a mutex by lock(mutex), when no thread is inside by its bias.
+template <class Lock>
+inline int lock_for_itself(pthread_mutex_t *mutex, Lock lock)
+{
+    for (;;) {
+        const int result = lock(mutex);
+        if (__builtin_expect(result != 0, 0) || has_lock(mutex)) return result;
+        pthread_mutex_unlock(mutex);
+        wait_for_biased();
+    }
+}
+
 // What everything that takes or releases one of the library's mutexes calls: the checked order knows no other. A mutex
 // without a name of its own is taken for a page's.
 inline int lock_mutex(pthread_mutex_t *mutex, lock_rank rank = lock_rank::page)
 {
     expect_in_order(mutex, rank);
-    const int result = pthread_mutex_lock(mutex);
+    const int result = may_be_biased(rank) ? lock_for_itself(mutex, pthread_mutex_lock) : pthread_mutex_lock(mutex);
     if (result == 0) note_taken(mutex, rank);
     return result;
 }
-inline int try_mutex(pthread_mutex_t *mutex)
+inline int try_mutex(pthread_mutex_t *mutex, lock_rank rank)
 {
-    const int result = pthread_mutex_trylock(mutex);
-    if (result == 0) note_taken(mutex, lock_rank::page);
+    int result = pthread_mutex_trylock(mutex);
+    if (result == 0 && may_be_biased(rank) && !has_lock(mutex)) {
+        pthread_mutex_unlock(mutex);
+        result = EBUSY;
+    }
+    if (result == 0) note_taken(mutex, rank);
     return result;
 }
 inline int unlock_mutex(pthread_mutex_t *mutex)
@@ -122,8 +145,8 @@ public:
     int result() const { return result_; }
 
 protected:
-    using lock_call = int(pthread_mutex_t *);
-    mutex_lock(pthread_mutex_t &mutex, lock_call *lock) : mutex_(&mutex), result_(lock(&mutex)) {}
+    using lock_call = int(pthread_mutex_t *, lock_rank);
+    mutex_lock(pthread_mutex_t &mutex, lock_rank rank, lock_call *lock) : mutex_(&mutex), result_(lock(&mutex, rank)) {}
 
 private:
     guard_mark mark_;
@@ -135,14 +158,17 @@ private:
 class mutex_try_lock : public mutex_lock
 {
 public:
-    explicit mutex_try_lock(pthread_mutex_t &mutex) : mutex_lock(mutex, &try_mutex) {}
+    explicit mutex_try_lock(pthread_mutex_t &mutex, lock_rank rank = lock_rank::page)
+        : mutex_lock(mutex, rank, &try_mutex)
+    {
+    }
 };
 
 // Holds the global mutex.
 class global_lock : public mutex_lock
 {
 public:
-    global_lock() : mutex_lock(anchors.anchorMutex) {}
+    global_lock() : mutex_lock(anchors.anchorMutex, lock_rank::global) {}
 };
 
 // Holds the global mutex, whatever came of locking it; releases it with its scope unless it is to stay locked.
@@ -186,14 +212,20 @@ inline int lock_briefly_held(pthread_mutex_t *mutex)
 #endif
 }
 
+inline lock_rank rank_of_set_mutex(const trace_anchor_t *anchor, const pthread_mutex_t *mutex)
+{
+    return mutex == &anchor->anchorMutex ? lock_rank::file : lock_rank::set;
+}
+
 // Takes that mutex and returns it if it is the anchor's set lock. Null when it could not be taken, with the lock's result
 // in `result`; or, with 0 there, when it is the right one no more: a start may turn a single file into a page set while a
 // thread waits.
 [[gnu::always_inline]] inline pthread_mutex_t *take_if_right(trace_anchor_t *anchor, pthread_mutex_t *mutex,
-                                                             lock_rank rank, int &result)
+                                                             int &result)
 {
+    const lock_rank rank = rank_of_set_mutex(anchor, mutex);
     expect_in_order(mutex, rank);
-    const int taken = lock_briefly_held(mutex);
+    const int taken = lock_for_itself(mutex, lock_briefly_held);
     if (__builtin_expect(taken != 0, 0)) {
         result = taken;
         return nullptr;
@@ -208,31 +240,14 @@ inline int lock_briefly_held(pthread_mutex_t *mutex)
 // `result`.
 pthread_mutex_t *take_anchor_set(trace_anchor_t *anchor, int &result);
 
-// The same, inline as far as it is over at once: for a single file, and for a page set.
-[[gnu::always_inline]] inline pthread_mutex_t *take_anchor_set_inline(trace_anchor_t *anchor, int &result)
-{
-    pthread_mutex_t *shared = load_acquire(anchor->pSpoolMutex);
-    pthread_mutex_t *taken = __builtin_expect(shared == nullptr, 1)
-                                 ? take_if_right(anchor, &anchor->anchorMutex, lock_rank::file, result)
-                                 : take_if_right(anchor, shared, lock_rank::set, result);
-    if (__builtin_expect(taken != nullptr, 1) || result != 0) return taken;
-    int result_of_set = 0; // so that the address of the caller's result is not taken
-    taken = take_anchor_set(anchor, result_of_set);
-    result = result_of_set;
-    return taken;
-}
-
 // Holds an anchor set lock. It releases the mutex that it took, whatever a start made of the anchor meanwhile.
 class anchor_set_lock
 {
 public:
-    [[gnu::always_inline]] explicit anchor_set_lock(trace_anchor_t *anchor)
-        : mutex_(take_anchor_set_inline(anchor, result_))
-    {
-    }
+    explicit anchor_set_lock(trace_anchor_t *anchor) : mutex_(take_anchor_set(anchor, result_)) {}
     anchor_set_lock(const anchor_set_lock &) = delete;
     anchor_set_lock &operator=(const anchor_set_lock &) = delete;
-    [[gnu::always_inline]] ~anchor_set_lock()
+    ~anchor_set_lock()
     {
         if (mutex_ != nullptr) unlock_mutex(mutex_);
     }
@@ -243,6 +258,50 @@ private:
     guard_mark mark_;
     int result_ = 0;
     pthread_mutex_t *mutex_;
+};
+
+// Holds an anchor set lock to write a record: by a bias, or else by the mutex.
+class writer_lock
+{
+public:
+    [[gnu::always_inline]] explicit writer_lock(trace_anchor_t *anchor)
+        : mutex_(anchor_set_mutex(anchor)), biased_(enter_biased(mutex_))
+    {
+        if (__builtin_expect(biased_ != nullptr, 1)) {
+            note_taken(mutex_, rank_of_set_mutex(anchor, mutex_));
+            return;
+        }
+        int result = 0;
+        mutex_ = take_if_right(anchor, mutex_, result);
+        if (__builtin_expect(mutex_ == nullptr && result == 0, 0)) mutex_ = take_anchor_set(anchor, result);
+    }
+    writer_lock(const writer_lock &) = delete;
+    writer_lock &operator=(const writer_lock &) = delete;
+    [[gnu::always_inline]] ~writer_lock()
+    {
+        if (__builtin_expect(biased_ != nullptr, 1)) {
+            note_released(mutex_);
+            leave_biased(biased_);
+        } else if (mutex_ != nullptr) {
+            unlock_mutex(mutex_);
+        }
+    }
+    explicit operator bool() const { return mutex_ != nullptr; }
+
+    // From here on the mutex is held, for what may have to wait; false when it could not be taken.
+    bool take_mutex()
+    {
+        if (biased_ == nullptr) return true;
+        if (pthread_mutex_lock(mutex_) != 0) return false;
+        leave_biased(biased_);
+        biased_ = nullptr;
+        return true;
+    }
+
+private:
+    guard_mark mark_;
+    pthread_mutex_t *mutex_;
+    biased_thread *biased_;
 };
 
 // Holds the lock of the page set that a single file may become. Binding the file to a specification makes that one its set

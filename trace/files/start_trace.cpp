@@ -35,11 +35,12 @@ qn_uint32_t round_page_size(qn_uint32_t bytes, qn_int32_t memory_page)
     return (bytes + page) & ~page;
 }
 
-pthread_mutex_t *new_recursive_mutex()
+pthread_mutex_t *new_biased_mutex()
 {
-    auto *mutex = static_cast<pthread_mutex_t *>(std::malloc(sizeof(pthread_mutex_t)));
-    if (mutex != nullptr) init_recursive_mutex(mutex);
-    return mutex;
+    auto *lock = static_cast<biased_mutex *>(std::malloc(sizeof(biased_mutex)));
+    if (lock == nullptr) return nullptr;
+    init_biased_mutex(&lock->mutex);
+    return &lock->mutex;
 }
 
 // Frees the pages from `first` up to the head; none of them is mapped.
@@ -94,7 +95,7 @@ qn_int32_t make_page_set(trace_anchor_t *head, qn_uint32_t pages, future_set_loc
     if (!has_room_for_page_names(base_name)) return set_error_str(QN_TR_EFILENAME, 17, head->fileName);
 
     // A set taken apart leaves its mutex behind, in case a thread still waits for it.
-    pthread_mutex_t *shared = head->pSpoolMutex != nullptr ? head->pSpoolMutex : new_recursive_mutex();
+    pthread_mutex_t *shared = head->pSpoolMutex != nullptr ? head->pSpoolMutex : new_biased_mutex();
     if (shared == nullptr) return set_error(QN_TR_ENOMEM, 14);
     lock.take(*shared);
     name_page(head->fileName, base_name, 1);
@@ -127,7 +128,7 @@ bool may_become_page_set(const trace_anchor_t *anchor)
 // must not wait for the other: while that is taken, the file stays a single one until its next start.
 qn_int32_t become_page_set_if_asked(trace_anchor_t *anchor, future_set_lock &lock)
 {
-    const mutex_try_lock global(anchors.anchorMutex);
+    const mutex_try_lock global(anchors.anchorMutex, lock_rank::global);
     if (!global) return 0;
     process_spool_spec(anchor, anchors.pFirstSpoolSpec);
     const qn_uint32_t pages = spooling_is_on(anchor) ? load_relaxed(anchor->spool->pages) : 0;

@@ -64,7 +64,7 @@ template <class Writer>
     if (status != 0) return status == nothing_to_write ? 0 : status;
 
     if (interrupts_a_guard()) return QN_TR_ELOCK;
-    const anchor_set_lock set(anchor);
+    writer_lock set(anchor);
     if (__builtin_expect(!set, 0)) return QN_TR_ELOCK;
     status = writer.check_locked(anchor);
     // Not even the fixed part fits: the trace is not active, or its ring is tiny.
@@ -74,7 +74,11 @@ template <class Writer>
     if (status != 0) return status == nothing_to_write ? 0 : status;
 
     trace_record_header_t *header = reserve(anchor, length);
-    if (__builtin_expect(header == nullptr, 0)) return 0;
+    if (__builtin_expect(header == nullptr, 0)) {
+        if (!set.take_mutex()) return QN_TR_ELOCK;
+        header = reserve_otherwise(anchor, length);
+        if (header == nullptr) return 0;
+    }
     copy_component_id(header->compId, comp_id);
     writer.fill(reinterpret_cast<typename Writer::record *>(header));
     keep_store_order();

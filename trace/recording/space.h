@@ -2,7 +2,8 @@
 //
 // Almost always the free pointer has a free rest and an old record or two behind it: nobody reads them, none of them is a
 // start record, and the end of the file is not near. Then space is these few loads and stores, inline in the writer.
-// Everything else goes the long way, allocate_space() in allocate.cpp, which tells the whole story.
+// Everything else goes the long way, allocate_space() in allocate.cpp, which tells the whole story. The short way waits for
+// nobody, and so a writer may go it by a bias (lock_bias.h).
 //
 // Anchor set lock, held by the caller.
 #pragma once
@@ -93,18 +94,18 @@ inline void stamp(trace_record_header_t *record)
     return active != nullptr && anchor->spool != nullptr && anchor->spool->onoff != 0 ? active : anchor;
 }
 
-// The long way, out of line.
+// The long way, out of line. It may have to wait: the mutex, held by the caller.
 trace_record_header_t *reserve_otherwise(trace_anchor_t *anchor, unsigned int requested);
 
-// What the writers call. A reader's request to wait, a record that is too long and the end of a page take the long way.
+// The short way; null when it does not lead there. A reader's request to wait, a record that is too long, and the end of a
+// page or of the file take the long way.
 [[gnu::always_inline]] inline trace_record_header_t *reserve(trace_anchor_t *anchor, unsigned int requested)
 {
     trace_anchor_t *page = page_to_write(anchor);
-    if (__builtin_expect(requested > page->uMaxSize || load_relaxed(header_of(page)->uTailReq) != 0, 0))
-        return reserve_otherwise(anchor, requested);
+    if (__builtin_expect(requested > page->uMaxSize || load_relaxed(header_of(page)->uTailReq) != 0, 0)) return nullptr;
     trace_record_header_t *record = page->pNextFree;
     const unsigned char *end = plain_end(page, address(record), qn_uint64_t{requested} + format::record_header_bytes);
-    if (__builtin_expect(end == nullptr, 0)) return reserve_otherwise(anchor, requested);
+    if (__builtin_expect(end == nullptr, 0)) return nullptr;
     unsigned char *next_free = cut_record(page, record, static_cast<qn_uint32_t>(end - address(record)), requested);
     move_free_pointer(page, next_free, static_cast<qn_uint32_t>(next_free - page->pMap));
     stamp(record);

@@ -95,10 +95,11 @@ void let_writers_go_first()
     if (sched_getscheduler(0) == SCHED_OTHER) sched_setscheduler(0, SCHED_BATCH, &ordinary);
 }
 
-// The default trace's interval, whatever the other traces have.
+// The default trace's interval, whatever the other traces have. Records may be written meanwhile, by a bias: no trace gets
+// another specification without the global mutex.
 qn_uint32_t seconds_to_wait()
 {
-    const anchor_set_lock set(&anchors);
+    const mutex_lock global(anchors.anchorMutex);
     return anchors.spool != nullptr ? anchors.spool->sync_interval : default_sync_seconds;
 }
 

@@ -131,6 +131,14 @@ def contention(build, rounds):
                 f"Handing a cache line to the other CPU took {handoff:.0f} ns in this run.")
     yield table("contention_latency", "Several threads, one record at a time",
                 ["threads", "system", "p50 ns", "p99 ns", "p99.9 ns", "p99.9 of the floor's"], tails)
+    rows = []
+    for pause in (100, 10_000):
+        timed = in_turns(rounds, {system.name: lambda system=system: system.measure("--visit", pause, "--seconds", 0.5)
+                                  for system in (Floor(build), Library(build))})
+        rows += [[f"{pause / 1000:g} ms", name, median(timed[name], "ns"), ratio(timed[name], timed["floor"], "ns")]
+                 for name in timed]
+    yield table("visits", "A busy thread, and one that writes a record now and then",
+                ["every", "system", "ns", "of the floor"], rows)
     library = Library(build)
     two = in_turns(rounds, {
         "one": lambda: fairness(library.measure("--files", 2, "--seconds", 0.5)),

@@ -310,14 +310,16 @@ QN_EXPORT void tr_term(void);
 /*   traceId    A number that tells the client's trace points apart.                                                */
 /*   fileToken  The trace file, NULL for the default file. The forms without "ms" write to the default file.        */
 /* A writer never tests levels: the client does (QN_TR_IF). It takes the trace file's lock, which other threads     */
-/* hold for the time of one record, allocates no memory and makes no system call, with two exceptions. Another      */
-/* process that reads the file may ask it to wait: at most 0.5 s, and 2 s for each record that is held while it is  */
-/* to be overwritten. And the record that fills a page of a page set queues that page for its copy: that allocates  */
-/* memory, and waits for the copy of another page. What does not fit into half of the file's ring is cut at the end */
-/* (strings, values, blocks, formatted text) or dropped (ids, errors); that is never an error, nor is a trace that  */
-/* is not active. Codes common to all: 0; 2 identifier NULL or empty; 9 lock failure. While tracing is stopped      */
-/* every writer returns 0 before it looks at any argument. The error record is left alone, unless there is no       */
-/* memory to queue a page (14) or a damaged ring cannot be begun afresh (17 to 23, 35).                             */
+/* hold for the time of one record, and allocates no memory. A thread that has written many records to a file in a  */
+/* row has its lock to itself, and the next one takes it away by one call of membarrier(2); apart from that, and    */
+/* from waiting for the lock, a writer makes no system call. There are two exceptions. Another process that reads   */
+/* the file may ask it to wait: at most 0.5 s, and 2 s for each record that is held while it is to be overwritten.  */
+/* And the record that fills a page of a page set queues that page for its copy: that allocates memory, and waits   */
+/* for the copy of another page. What does not fit into half of the file's ring is cut at the end (strings, values, */
+/* blocks, formatted text) or dropped (ids, errors); that is never an error, nor is a trace that is not active.     */
+/* Codes common to all: 0; 2 identifier NULL or empty; 9 lock failure. While tracing is stopped every writer        */
+/* returns 0 before it looks at any argument. The error record is left alone, unless there is no memory to queue a  */
+/* page (14) or a damaged ring cannot be begun afresh (17 to 23, 35).                                               */
 /* ---------------------------------------------------------------------------------------------------------------- */
 
 /* Writes one number: the cheapest record, 32 bytes. */

@@ -63,6 +63,7 @@ void add_common_options(CLI::App &app, options &all)
         ->check(CLI::IsMember(std::vector<std::string>(kinds.begin(), kinds.end())));
     app.add_option("--threads", all.threads, "that record");
     app.add_option("--idle-threads", all.idle_threads, "that do nothing");
+    app.add_option("--visit", all.visit_us, "microseconds between the records of one more thread, which are not counted");
     app.add_option("--records", all.records, "of each thread, instead of --seconds");
     app.add_option("--seconds", all.seconds, "how long records are written");
     app.add_option("--warm-up", all.warm_up, "records of each thread before the measured ones");
@@ -101,6 +102,13 @@ std::string measure(const options &all, recording_loop loop, void *system)
     std::vector<std::thread> idle_threads;
     for (unsigned i = 0; i < all.idle_threads; ++i) idle_threads.emplace_back([&idle] { idle.wait(true); });
 
+    std::atomic<bool> no_more_visits = false;
+    thread_result visits;
+    std::thread visitor;
+    if (all.visit_us > 0)
+        visitor = std::thread(loop, thread_order{system, all.threads, 0, 1, all.visit_us, false, &no_more_visits},
+                              std::ref(visits));
+
     double cpu_begin = 0;
     std::uint64_t ticks_begin = 0;
     clock::time_point begin;
@@ -136,6 +144,8 @@ std::string measure(const options &all, recording_loop loop, void *system)
     idle = false;
     idle.notify_all();
     for (std::thread &each : idle_threads) each.join();
+    no_more_visits = true;
+    if (visitor.joinable()) visitor.join();
 
     nlohmann::ordered_json result;
     std::uint64_t records = 0, ticks = 0;

@@ -29,6 +29,7 @@ struct options {
     kind record = kind::values;
     unsigned threads = 1;
     unsigned idle_threads = 1; // that do nothing: a process with one thread pays less for its locks
+    double visit_us = 0;       // one more thread writes a record now and then, after such a pause; not counted. 0: none
     std::uint64_t records = 0; // of each thread; 0: until the time is up
     double seconds = 0.2;
     std::uint64_t warm_up = 100000; // records of each thread before the measured ones

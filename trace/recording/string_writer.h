@@ -10,6 +10,12 @@ namespace qn::tr
 // The trace id of the forms that are not given one.
 inline constexpr qn_uint32_t no_trace_id = 0xFFFFFFFF;
 
+// A string's bytes with its terminator; 0 for one that is null or empty, which no record may have.
+inline size_t bytes_of(const char *string)
+{
+    return string != nullptr && string[0] != '\0' ? std::strlen(string) + 1 : 0;
+}
+
 struct string_writer : record_writer {
     static constexpr auto function = format::kind::strings;
     using record = trace_record_strings_t;
@@ -25,8 +31,8 @@ struct string_writer : record_writer {
     // the last word.
     qn_int32_t check(const trace_anchor_t *anchor)
     {
-        if (string == nullptr || string[0] == '\0') return QN_TR_ESTRING;
-        const size_t size = std::strlen(string) + 1;
+        const size_t size = bytes_of(string);
+        if (size == 0) return QN_TR_ESTRING;
         const qn_uint32_t longest = load_relaxed(anchor->uMaxSize);
         if (__builtin_expect(size > longest, 0)) {
             if (longest == 0) return nothing_to_write; // not active: what is started meanwhile gets no empty record

@@ -35,8 +35,8 @@ struct strings_writer : record_writer {
         const qn_uint32_t longest = load_relaxed(anchor->uMaxSize);
         for (qn_uint32_t i = 0; i < number; ++i) {
             const char *string = va_arg(arguments, const char *);
-            if (string == nullptr || string[0] == '\0') return QN_TR_ESTRING;
-            const size_t size = std::strlen(string) + 1;
+            const size_t size = bytes_of(string);
+            if (size == 0) return QN_TR_ESTRING;
             if (len_strings + size > longest) {
                 if (longest == 0) return nothing_to_write; // not active: what is started meanwhile gets no empty record
                 number = i;

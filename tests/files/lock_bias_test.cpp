@@ -382,6 +382,17 @@ TEST_F(LockBias, IsRevokedAndNeverGivenAgainWhenTheBarrierIsForbiddenMeanwhile)
     EXPECT_FALSE(is_biased());
 }
 
+TEST_F(LockBias, IsRevokedByAWriterWithoutChangingErrno)
+{
+    trace_with_bias();
+    barrier_is_there = false;
+    in_thread([this] {
+        errno = ENXIO;
+        write(1);
+        EXPECT_EQ(errno, ENXIO);
+    });
+}
+
 TEST_F(LockBias, IsGivenToAsManyThreadsAsThereAreMarks)
 {
     setenv("QN_TR_SIZE", "4000000", 1);

@@ -110,6 +110,34 @@ TEST_F(SpoolThread, WaitsForAnHour)
     EXPECT_TRUE(system_log_has("Spool thread about to sleep (max=3600)\n"));
 }
 
+TEST_F(SpoolThread, DoesNotWaitForWhoeverHasTheGlobalMutexWhenTheDefaultTraceHasPages)
+{
+    trace_spool_spec_t spec{};
+    qn::tr::biased_mutex of_set;
+    init_biased_mutex(&of_set.mutex);
+    anchors.spool = &spec;
+    anchors.pSpoolMutex = &of_set.mutex;
+    const qn::tr::global_lock held;
+    start_thread();
+    wait_for_waits(1);
+    end_thread();
+    anchors.spool = nullptr;
+    anchors.pSpoolMutex = nullptr;
+}
+
+#ifndef __SANITIZE_THREAD__ // no lock is biased there
+TEST_F(SpoolThread, LeavesTheBiasOfTheDefaultTracesLockAsItIs)
+{
+    for (int i = 0; i < 300; ++i) EXPECT_TRUE(qn::tr::anchor_set_lock(&anchors));
+    ASSERT_NE(anchors.anchorBias.towards, nullptr);
+    start_thread();
+    wait_for_waits(1);
+    wake_thread();
+    wait_for_waits(2);
+    EXPECT_NE(anchors.anchorBias.towards, nullptr);
+}
+#endif
+
 TEST_F(SpoolThread, WaitsForTheIntervalOfTheDefaultTrace)
 {
     trace_spool_spec_t spec{};

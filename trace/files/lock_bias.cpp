@@ -2,6 +2,7 @@
 #include "trace/files/lock_bias.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <ctime>
 #include <linux/membarrier.h>
 #include <sys/syscall.h>
@@ -11,43 +12,68 @@ namespace qn::tr
 {
 namespace
 {
-// To revoke a bias costs some hundred times what a record by a bias is cheaper. Twice as many records are asked for each
-// time that another writer came by, up to a number that makes this nothing.
+// To revoke a bias costs what some thousand records by it save. Whenever that happens, twice as many are asked for, up to
+// a number that makes it next to nothing.
 constexpr qn_uint32_t enough_at_first = 256;
-constexpr qn_uint32_t most_that_is_enough = 1U << 20;
+constexpr qn_uint32_t most_that_is_enough = 1U << 16;
 
 bool is_allowed = false;
 
-// Threads that end leave theirs behind, for a later one with the same thread pointer. When all are taken, the locks of
-// further threads are not biased.
+// Threads that end leave theirs behind, for a later one with the same thread pointer. When all are taken, no lock is
+// biased towards further threads.
 constinit biased_thread threads[64];
-
-int membarrier(int command) { return static_cast<int>(syscall(SYS_membarrier, command, 0, 0)); }
 
 // The calling thread's; null when there is none left.
 biased_thread *own_mark()
 {
     const uintptr_t self = own_thread_pointer();
     for (biased_thread &each : threads) {
-        uintptr_t expected = 0;
-        if (load_relaxed(each.thread) == self) return &each;
-        if (__atomic_compare_exchange_n(&each.thread, &expected, self, false, __ATOMIC_RELAXED, __ATOMIC_RELAXED))
+        uintptr_t taken_by = load_relaxed(each.thread);
+        if (taken_by == 0 &&
+            __atomic_compare_exchange_n(&each.thread, &taken_by, self, false, __ATOMIC_RELAXED, __ATOMIC_RELAXED))
             return &each;
+        if (taken_by == self) return &each;
     }
     return nullptr;
 }
 
+// A record writer leaves errno alone.
+class errno_kept
+{
+public:
+    errno_kept() : before_(errno) {}
+    errno_kept(const errno_kept &) = delete;
+    errno_kept &operator=(const errno_kept &) = delete;
+    ~errno_kept() { errno = before_; }
+
+private:
+    int before_;
+};
+
+bool membarrier(int command)
+{
+    const errno_kept of_caller;
+    return syscall(SYS_membarrier, command, 0, 0) == 0;
+}
+
+// Signals do not end it. Unlike clock_nanosleep() no cancellation point, as a mutex is none.
 void wait(long nanoseconds)
 {
-    const timespec time{0, nanoseconds};
-    syscall(SYS_nanosleep, &time, nullptr); // unlike nanosleep() no cancellation point, as a mutex is none
+    const errno_kept of_caller;
+    timespec end{};
+    clock_gettime(CLOCK_MONOTONIC, &end);
+    end.tv_nsec += nanoseconds;
+    end.tv_sec += end.tv_nsec / 1000000000;
+    end.tv_nsec %= 1000000000;
+    while (syscall(SYS_clock_nanosleep, CLOCK_MONOTONIC, TIMER_ABSTIME, &end, nullptr) != 0 && errno == EINTR) {
+    }
 }
 } // namespace
 
 void allow_bias()
 {
 #ifndef __SANITIZE_THREAD__ // it knows nothing of that barrier
-    store_relaxed(is_allowed, membarrier(MEMBARRIER_CMD_REGISTER_PRIVATE_EXPEDITED) == 0);
+    store_relaxed(is_allowed, membarrier(MEMBARRIER_CMD_REGISTER_PRIVATE_EXPEDITED));
 #endif
 }
 
@@ -64,13 +90,12 @@ bool revoke_bias(lock_bias &bias)
         bias.leaving = bias.towards;
         store_relaxed(bias.towards, nullptr);
         bias.enough = std::min(2 * bias.enough, most_that_is_enough);
-        if (membarrier(MEMBARRIER_CMD_PRIVATE_EXPEDITED) != 0) { // forbidden meanwhile
+        if (!membarrier(MEMBARRIER_CMD_PRIVATE_EXPEDITED)) { // forbidden meanwhile
             store_relaxed(is_allowed, false);
             wait(1000000); // no store takes that long to be seen
         }
     }
-    if (bias.leaving != nullptr && bias.leaving->thread != self && load_acquire(bias.leaving->inside) == &bias)
-        return false;
+    if (bias.leaving != nullptr && load_acquire(bias.leaving->inside) == &bias) return bias.leaving->thread == self;
     bias.leaving = nullptr;
     bias.holder = self;
     bias.times = 0;
@@ -88,5 +113,10 @@ void bias_towards_holder(lock_bias &bias)
     store_relaxed(bias.towards, mark);
 }
 
-void wait_for_biased() { wait(20000); }
+void wait_for_biased(unsigned times_before)
+{
+    constexpr long first_ns = 20000;
+    constexpr unsigned most_doublings = 8;
+    wait(first_ns << std::min(times_before, most_doublings));
+}
 } // namespace qn::tr

@@ -1,8 +1,9 @@
 // Biased locking: the one thread that writes to a trace need not take its set lock.
 //
 // The atomic instructions of a mutex are a third of what a record costs, and most traces have one busy writer. So a set
-// lock is biased towards a thread that wrote many records in a row: that one marks itself as inside, by a plain store, and
-// sees whether the bias is still there. Whoever else wants the lock takes the mutex, and revokes the bias first:
+// lock is biased towards a thread that took it many times in a row. To write a record that one marks itself as inside, by
+// a plain store, and sees whether the bias is still there. Whoever else wants the lock takes the mutex, and revokes the
+// bias first:
 //
 //   the biased thread                     another one, which has the mutex
 //     inside = this lock                    towards = nobody
@@ -11,8 +12,12 @@
 //
 // By that barrier one of the two at least sees what the other stored. A system without it has no biased locks.
 //
-// Inside by a bias, a thread only does what cannot make it wait. For anything else it takes the mutex as well, and stays
-// inside until it has it: it is never without the lock. That is why whoever waits for it gives the mutex back meanwhile.
+// Inside by a bias, a thread takes no lock and makes no call that waits. For anything else it takes the mutex as well, and
+// stays inside until it has it: it is never without the lock. That is why whoever waits for it gives the mutex back
+// meanwhile. Only a page of memory that is not there can hold it up inside.
+//
+// Unlike one who took the mutex, a thread that entered does not look whether that mutex is still the trace's set lock.
+// Whoever makes another one the set lock holds this one, and thus has revoked the bias.
 //
 // Guarded by the mutex that the bias belongs to: all of lock_bias. Each mark is stored by its thread alone.
 #pragma once
@@ -30,17 +35,17 @@ namespace qn::tr
 struct lock_bias;
 
 // A thread that a lock is or was biased towards. It may come to store its mark long after the bias was revoked, when the
-// lock is biased towards another: so every thread has a mark of its own, as long as there are threads.
+// lock is biased towards another: so every thread has a mark of its own, which is never another's before it has ended.
 struct alignas(64) biased_thread {
     uintptr_t thread; // its thread pointer
     const lock_bias *inside;
 };
 
 struct lock_bias {
-    biased_thread *towards; // null: nobody. Also read by the biased thread
+    biased_thread *towards; // null: nobody. Every writer reads it without the mutex
     biased_thread *leaving; // was inside when the bias was revoked
-    uintptr_t holder;       // thread pointer of who took the mutex last; 0: a bias is to be looked at first
-    qn_uint32_t times;      // that it took it in a row
+    uintptr_t holder;       // thread pointer of who took the mutex last; 0: nobody yet, or there is a bias to look at
+    qn_uint32_t times;      // that it took it in a row, for whatever
     qn_uint32_t enough;     // times for a bias towards it
 };
 
@@ -66,7 +71,7 @@ void forget_biased_threads();
     const lock_bias &bias = bias_of(mutex);
     biased_thread *self = load_relaxed(bias.towards);
     if (self == nullptr || self->thread != own_thread_pointer()) return nullptr;
-    store_relaxed(self->inside, &bias);
+    store_release(self->inside, &bias); // who waits for it to leave another lock sees all that it did there
     std::atomic_signal_fence(std::memory_order_seq_cst);
     if (__builtin_expect(load_relaxed(bias.towards) == self, 1)) return self;
     store_release(self->inside, nullptr);
@@ -87,6 +92,6 @@ inline bool has_lock(pthread_mutex_t *mutex)
     return true;
 }
 
-// Some microseconds; a record takes less than one.
-void wait_for_biased();
+// Waits for a thread that is inside, a longer time each time: 20 us, which is a long record's, to 5 ms.
+void wait_for_biased(unsigned times_before);
 } // namespace qn::tr

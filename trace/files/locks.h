@@ -94,11 +94,11 @@ constexpr bool may_be_biased(lock_rank rank) { return rank <= lock_rank::set; }
 template <class Lock>
 inline int lock_for_itself(pthread_mutex_t *mutex, Lock lock)
 {
-    for (;;) {
+    for (unsigned times = 0;; ++times) {
         const int result = lock(mutex);
         if (__builtin_expect(result != 0, 0) || has_lock(mutex)) return result;
         pthread_mutex_unlock(mutex);
-        wait_for_biased();
+        wait_for_biased(times);
     }
 }
 

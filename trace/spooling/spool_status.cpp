@@ -30,7 +30,8 @@ void describe(const trace_anchor_t *anchor, tr_mini_spooling_anchor_t &record)
     }
 }
 
-// The default anchor's mutex is the global one, which the caller holds.
+// The default anchor's mutex is the global one, which the caller holds. Without that, nothing changes of what is read here:
+// a thread that writes records by a bias is not kept out.
 int lock_anchor(trace_anchor_t *anchor)
 {
     const int result = anchor != &anchors ? lock_mutex(&anchor->anchorMutex) : 0;

@@ -95,12 +95,16 @@ void let_writers_go_first()
     if (sched_getscheduler(0) == SCHED_OTHER) sched_setscheduler(0, SCHED_BATCH, &ordinary);
 }
 
-// The default trace's interval, whatever the other traces have. Records may be written meanwhile, by a bias: no trace gets
-// another specification without the global mutex.
+// The default trace's interval, whatever the other traces have. Its set lock is taken as a plain mutex, which leaves a bias
+// as it is: a record that is written meanwhile changes no specification, and this comes once for each page.
 qn_uint32_t seconds_to_wait()
 {
-    const mutex_lock global(anchors.anchorMutex);
-    return anchors.spool != nullptr ? anchors.spool->sync_interval : default_sync_seconds;
+    for (;;) {
+        pthread_mutex_t *mutex = anchor_set_mutex(&anchors);
+        const mutex_lock set(*mutex);
+        if (mutex != anchor_set_mutex(&anchors)) continue; // a page set by now, or a single file
+        return anchors.spool != nullptr ? anchors.spool->sync_interval : default_sync_seconds;
+    }
 }
 
 // Waits for something to do. Tests once more, under the mutex that whoever signals holds, that there is nothing yet.

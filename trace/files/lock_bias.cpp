@@ -21,7 +21,7 @@ bool is_allowed = false;
 
 // Threads that end leave theirs behind, for a later one with the same thread pointer. When all are taken, no lock is
 // biased towards further threads.
-constinit biased_thread threads[64];
+constinit biased_thread threads[64] = {};
 
 // The calling thread's; null when there is none left.
 biased_thread *own_mark()

@@ -24,13 +24,13 @@ int read_pair(clockid_t clock, clock_pair *pair)
     return 0;
 }
 
-int read_narrow_pair(clockid_t clock, clock_pair *pair)
+int read_narrow_pair(clockid_t clock, clock_pair *pair, pair_reader read)
 {
     constexpr int readings = 16;
-    if (const int error = read_pair(clock, pair); error != 0) return error;
+    if (const int error = read(clock, pair); error != 0) return error;
     for (int i = 1; i < readings; ++i) {
         clock_pair another;
-        if (read_pair(clock, &another) == 0 && another.width < pair->width) *pair = another;
+        if (read(clock, &another) == 0 && another.width < pair->width) *pair = another;
     }
     return 0;
 }

@@ -17,6 +17,9 @@ struct clock_pair {
 // One reading. Returns 0 or errno.
 int read_pair(clockid_t clock, clock_pair *pair);
 
+// read_pair, or what stands in for it where clock and counter are to misbehave as told.
+using pair_reader = int (*)(clockid_t clock, clock_pair *pair);
+
 // The narrowest of several readings: one that was interrupted half-way does not count. About a microsecond.
-int read_narrow_pair(clockid_t clock, clock_pair *pair);
+int read_narrow_pair(clockid_t clock, clock_pair *pair, pair_reader read = read_pair);
 } // namespace qn::cu

@@ -27,7 +27,9 @@ struct thread_error {
     bool armed;         // this thread's value of the key is set
 };
 
-constinit thread_local thread_error thread_record{};
+// Initial-exec: a thread has the place for it from its start. Otherwise, where the library came by dlopen(), the first
+// use in a thread would allocate it, and the system ends a process that has no memory for that.
+constinit thread_local thread_error thread_record __attribute__((tls_model("initial-exec"))){};
 
 // Called by the system at the end of a thread.
 void release_thread_record(void *ending)

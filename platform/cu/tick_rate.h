@@ -13,18 +13,4 @@ double clock_speed(long freq, long tick);
 
 // The factor at this moment; 1 where adjtimex() may not be asked.
 double present_clock_speed();
-
-// The slope of the straight line that fits points best.
-class line_fit
-{
-public:
-    void add(double x, double y);
-    double slope() const; // meaningless for fewer than two different x
-    int points() const { return points_; }
-
-private:
-    int points_ = 0;
-    long double mean_x_ = 0, mean_y_ = 0; // running means and sums of products around them: no digits are lost
-    long double xx_ = 0, xy_ = 0;
-};
 } // namespace qn::cu

@@ -1,4 +1,4 @@
-// How fast the counter runs: the kernel's possible rates, the hints, the slope, the steering of the clock.
+// How fast the counter runs: the kernel's possible rates, the hints, the steering of the clock.
 #include "platform/cu/tick_rate.h"
 
 #include <cmath>
@@ -86,22 +86,6 @@ TEST(FrequencyHint, IsNoneInATextThatDoesNotSay)
     EXPECT_FALSE(frequency_in_cpuinfo(flags + "cpu MHz : 2445\n"));
     EXPECT_FALSE(frequency_in_cpuinfo(flags + "cpu MHz : 2445.4\n"));
     EXPECT_FALSE(frequency_in_cpuinfo(flags + "cpu MHz : 2445.4x6\n"));
-}
-
-TEST(LineFit, FindsTheSlopeOfALine)
-{
-    line_fit fit;
-    for (int x = 0; x < 100; ++x) fit.add(x, 3.5 * x + 1e12);
-    EXPECT_NEAR(fit.slope(), 3.5, 1e-9);
-    EXPECT_EQ(fit.points(), 100);
-}
-
-TEST(LineFit, EvensOutPointsBesideTheLine)
-{
-    line_fit fit;
-    for (int x = 0; x < 100; ++x)
-        for (const double beside : {-10.0, 10.0}) fit.add(x, 2.0 * x + beside);
-    EXPECT_NEAR(fit.slope(), 2, 1e-12);
 }
 
 TEST(ClockSpeed, IsOneForAnUnsteeredClock) { EXPECT_DOUBLE_EQ(clock_speed(0, 10'000), 1); }

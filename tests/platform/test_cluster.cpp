@@ -3,6 +3,8 @@
 #include <filesystem>
 #include <fstream>
 #include <string>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <gtest/gtest.h>
 #include <qn_cu.h>
@@ -147,6 +149,66 @@ TEST(Cluster, AFolderInPlaceOfTheFileIsAnError)
         std::filesystem::create_directories("/var/qn/cfg/cluster.conf");
         cu_cluster_info_t info;
         EXPECT_EQ(cu_get_cluster_info_1(&info), EISDIR);
+        return true;
+    }));
+}
+
+TEST(Cluster, APipeWithoutAWriterIsNotWaitedFor)
+{
+    EXPECT_TRUE(in_private_var([] {
+        std::filesystem::create_directories("/var/qn/cfg");
+        EXPECT_EQ(mkfifo("/var/qn/cfg/cluster.conf", 0600), 0);
+        alarm(20); // ends the test that hangs
+        cu_cluster_info_t info;
+        EXPECT_EQ(cu_get_cluster_info_1(&info), 0);
+        EXPECT_STREQ(info.cu_cluster_name, "");
+        return true;
+    }));
+}
+
+constexpr size_t most_bytes = 64 << 10;
+const std::string last_line = "node_number = 12345";
+
+// What is known of a file whose last line ends with that byte, and what follows the line.
+qn_int32_t node_number_ending_at(size_t byte, const std::string &behind)
+{
+    const std::string first_line = "cluster_name = big\n";
+    write_conf(first_line + std::string(byte - first_line.size() - last_line.size() - 1, '#') + "\n" + last_line +
+               behind);
+    cu_cluster_info_t info;
+    EXPECT_EQ(cu_get_cluster_info_1(&info), 0);
+    EXPECT_STREQ(info.cu_cluster_name, "big");
+    return info.cu_node_number;
+}
+
+TEST(Cluster, ALineThatCrossesTheEndOfWhatIsReadDoesNotCount)
+{
+    EXPECT_TRUE(in_private_var([] {
+        for (const size_t beyond : {1, 2, 5, 6, 18})
+            EXPECT_EQ(node_number_ending_at(most_bytes + beyond, "\nnode_number = 7\n"), 0) << beyond;
+        EXPECT_EQ(node_number_ending_at(most_bytes, "6"), 0);
+        return true;
+    }));
+}
+
+TEST(Cluster, ALineThatEndsWhereTheReadingEndsCounts)
+{
+    EXPECT_TRUE(in_private_var([] {
+        EXPECT_EQ(node_number_ending_at(most_bytes, ""), 12345);
+        EXPECT_EQ(node_number_ending_at(most_bytes, "\n"), 12345);
+        EXPECT_EQ(node_number_ending_at(most_bytes, "\nnode_number = 7\n"), 12345);
+        EXPECT_EQ(node_number_ending_at(most_bytes - 1, "\nnode_number = 7\n"), 12345);
+        return true;
+    }));
+}
+
+TEST(Cluster, AFileOfOneEndlessLineSaysNothing)
+{
+    EXPECT_TRUE(in_private_var([] {
+        write_conf("cluster_name = " + std::string(most_bytes * 2, 'x'));
+        cu_cluster_info_t info;
+        EXPECT_EQ(cu_get_cluster_info_1(&info), 0);
+        EXPECT_STREQ(info.cu_cluster_name, "");
         return true;
     }));
 }

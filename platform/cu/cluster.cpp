@@ -8,6 +8,7 @@
 #include <qn_cu.h>
 
 #include "platform/common/files.h"
+#include "platform/common/machine_id.h"
 #include "platform/cu/cluster_conf.h"
 
 namespace qn::cu
@@ -15,9 +16,7 @@ namespace qn::cu
 namespace
 {
 constexpr const char *cluster_file = "/var/qn/cfg/cluster.conf";
-constexpr const char *machine_file = "/etc/machine-id";
 constexpr size_t most_cluster_bytes = 64 << 10;
-constexpr size_t node_id_digits = 16;
 
 // Of a longer text the lines that end within the bytes that count.
 std::string_view whole_lines(std::string_view text)
@@ -34,18 +33,6 @@ int read_cluster_conf(cluster_conf *conf)
     const int error = platform::read_file(cluster_file, {text.get(), bytes}, &length);
     if (error == 0) *conf = parse_cluster_conf(whole_lines({text.get(), length}));
     return error;
-}
-
-int read_machine_id(qn_uint64_t *id)
-{
-    char digits[node_id_digits];
-    size_t length = 0;
-    const int error = platform::read_file(machine_file, digits, &length);
-    if (error != 0) return error;
-    const auto number = parse_hexadecimal({digits, length});
-    if (length != node_id_digits || !number) return ENODATA;
-    *id = *number;
-    return 0;
 }
 } // namespace
 } // namespace qn::cu
@@ -68,5 +55,5 @@ int cu_get_node_id_1(qn_uint64_t *node_id)
         *node_id = *conf.node_id;
         return 0;
     }
-    return qn::cu::read_machine_id(node_id);
+    return qn::platform::read_machine_id(node_id);
 }

@@ -263,6 +263,41 @@ TEST(Cluster, AFileWithoutANodeIdLeavesItToTheMachine)
     }));
 }
 
+// What cu_get_node_id_1 says where /etc/machine-id holds that text.
+struct node_id_answer {
+    int result;
+    qn_uint64_t id;
+    bool operator==(const node_id_answer &) const = default;
+};
+
+node_id_answer with_machine_id(const std::string &text)
+{
+    qn::test::use_machine_id(text);
+    node_id_answer answer{.result = -1, .id = 77};
+    answer.result = cu_get_node_id_1(&answer.id);
+    return answer;
+}
+
+TEST(Cluster, TheMachinesNodeIdIsMadeOfTheFirst16Digits)
+{
+    EXPECT_TRUE(in_private_var([] {
+        EXPECT_EQ(with_machine_id("0123456789abcdef0123456789abcdef\n"), (node_id_answer{0, 0x0123456789abcdefU}));
+        EXPECT_EQ(with_machine_id("FEDCBA9876543210"), (node_id_answer{0, 0xfedcba9876543210U}));
+        return true;
+    }));
+}
+
+TEST(Cluster, AMachineIdThatDoesNotBeginWith16HexadecimalDigitsIsNone)
+{
+    EXPECT_TRUE(in_private_var([] {
+        for (const char *text :
+             {"0x123456789012345678901234567890", "0X12345678901234", "", "\n", "0123456789abcde", "0123456789abcde\n",
+              " 0123456789abcdef", "-123456789abcdef", "+123456789abcdef", "0123456789abcdeg", "uninitialized\n"})
+            EXPECT_EQ(with_machine_id(text), (node_id_answer{ENODATA, 0})) << text;
+        return true;
+    }));
+}
+
 TEST(Cluster, NullPointersAreRefused)
 {
     EXPECT_EQ(cu_get_cluster_info_1(nullptr), EINVAL);

@@ -76,7 +76,8 @@ typedef struct cu_error {
  * Strings and inserts are copied; the caller's may go away after the call. Understood are the conversions
  * d i u o x X c s p e E f F g G a A %, the flags, a width and a precision (numbers or '*'), the lengths hh h l
  * ll q L j z t, and positions ("%2$s %1$d", up to 64). C and S and l with c or s (wide characters) are kept as
- * multibyte text, and n takes its argument and leaves it alone. The reading of inserts stops for good at a
+ * multibyte text, and n takes its argument and leaves it alone. Of a string with a precision no more is read, or
+ * kept, than is shown; like printf's it need not end with a NUL. The reading of inserts stops for good at a
  * conversion that is none of these: it cannot be known what follows.
  *
  * Returns error_id, so that a function can end with "return cu_set_error_1(...)". It does not fail: when no
@@ -115,8 +116,9 @@ QN_EXPORT void cu_rel_error_1(cu_error_t *error);
  * The text is the catalogue's (found by NLSPATH and the locale's LC_MESSAGES) when there is one and its
  * conversions fit the recorded inserts, otherwise cu_msg_default. A catalogue is data from outside: whatever
  * conversions it has, only recorded inserts of the right type are read. A conversion of the default text that
- * has no insert stays as it is written. A width or a precision counts for at most 4095. A null string insert
- * reads "(null)". Without any text the result is "".
+ * has no insert stays as it is written. A width, or the precision of a number, counts for at most 4095. The
+ * precision of a string counts bytes; it does not cut a wide character in two. A null string insert reads
+ * "(null)". Without any text the result is "".
  *
  * Returns 0; EINVAL when an argument is null; ENOMEM, with *text null, when there is no memory.
  */
@@ -206,7 +208,7 @@ typedef struct cu_cluster_info {
  *
  * '#' starts a comment anywhere in a line. Blanks around key and value do not count; lines that make no sense
  * are ignored, and of two lines with the same key the last one holds. A missing string is "", a missing number
- * 0. Only the first 64 KiB are read.
+ * 0. Only whole lines in the first 64 KiB count.
  *
  * Returns 0; EINVAL when info is null; the error of opening or reading the file (ENOENT: no cluster here), with
  * *info all zero.

@@ -7,6 +7,8 @@
 #pragma once
 
 #include <cerrno>
+#include <csignal>
+#include <cstdint>
 #include <cstdio>
 #include <ctime>
 #include <fcntl.h>
@@ -99,12 +101,46 @@ inline int open_file(const char *path, int flags, mode_t mode = 0, int first = s
     return moved;
 }
 
-// fopen() of a text to be read. "c": reading is no cancellation point, so that a cancelled thread leaves no stream
-// behind.
+// Gives a pipe's writer two seconds, which signals do not prolong. True when reading may have come to something.
+inline bool writer_has_written(int fd)
+{
+    pollfd pipe{fd, POLLIN, 0};
+    const timespec most{2, 0};
+    sigset_t all;
+    sigfillset(&all);
+    return ppoll(&pipe, 1, &most, &all) > 0;
+}
+
+// The descriptor of a text is its stream's cookie.
+inline int text_number(const void *cookie) { return static_cast<int>(reinterpret_cast<intptr_t>(cookie)); }
+
+inline ssize_t read_text(void *cookie, char *buffer, size_t size)
+{
+    const no_cancel whole;
+    const int fd = text_number(cookie);
+    ssize_t got = -1;
+    do got = read(fd, buffer, size);
+    while (got == -1 && (errno == EINTR || (errno == EAGAIN && writer_has_written(fd))));
+    return got;
+}
+
+inline int close_text(void *cookie)
+{
+    close_for_sure(text_number(cookie));
+    return 0;
+}
+
+// fopen() of a text to be read. Neither this nor the reading is a cancellation point, so that a cancelled thread leaves
+// no stream behind; and neither waits for ever: a pipe without a writer is empty, and a writer that is there gets a little
+// time.
 inline FILE *open_text(const char *path)
 {
-    const standard_numbers_taken other_numbers;
-    return std::fopen(path, "rce");
+    const no_cancel whole;
+    const int fd = open_file(path, O_RDONLY | O_NONBLOCK);
+    if (fd == -1) return nullptr;
+    FILE *text = fopencookie(reinterpret_cast<void *>(intptr_t{fd}), "r", {read_text, nullptr, nullptr, close_text});
+    if (text == nullptr) close_for_sure(fd);
+    return text;
 }
 
 // catopen() of a message catalogue, in the language of the locale.

@@ -38,11 +38,12 @@ private:
     int error_;
 };
 
-// Fills `buffer` from the start of a file, up to its end or the buffer's. Returns 0 with *length set, or errno.
+// Fills `buffer` from the start of a file, up to its end or the buffer's. Returns 0 with *length set, or errno. Waits for
+// nobody: a pipe without a writer is empty, one whose writer has written nothing yet gives EAGAIN.
 inline int read_file(const char *path, std::span<char> buffer, size_t *length)
 {
     const no_cancel whole;
-    const file source(path, O_RDONLY);
+    const file source(path, O_RDONLY | O_NONBLOCK);
     if (source.error() != 0) return source.error();
     size_t have = 0;
     while (have < buffer.size()) {

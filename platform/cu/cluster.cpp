@@ -3,10 +3,12 @@
 #include <cerrno>
 #include <memory>
 #include <new>
+#include <string_view>
 
 #include <qn_cu.h>
 
 #include "platform/common/files.h"
+#include "platform/common/machine_id.h"
 #include "platform/cu/cluster_conf.h"
 
 namespace qn::cu
@@ -14,30 +16,23 @@ namespace qn::cu
 namespace
 {
 constexpr const char *cluster_file = "/var/qn/cfg/cluster.conf";
-constexpr const char *machine_file = "/etc/machine-id";
 constexpr size_t most_cluster_bytes = 64 << 10;
-constexpr size_t node_id_digits = 16;
+
+// Of a longer text the lines that end within the bytes that count.
+std::string_view whole_lines(std::string_view text)
+{
+    return text.size() <= most_cluster_bytes ? text : text.substr(0, text.rfind('\n') + 1);
+}
 
 int read_cluster_conf(cluster_conf *conf)
 {
-    const std::unique_ptr<char[]> text(new (std::nothrow) char[most_cluster_bytes]);
+    constexpr size_t bytes = most_cluster_bytes + 1; // one more tells whether the last line ends there
+    const std::unique_ptr<char[]> text(new (std::nothrow) char[bytes]);
     if (!text) return ENOMEM;
     size_t length = 0;
-    const int error = platform::read_file(cluster_file, {text.get(), most_cluster_bytes}, &length);
-    if (error == 0) *conf = parse_cluster_conf({text.get(), length});
+    const int error = platform::read_file(cluster_file, {text.get(), bytes}, &length);
+    if (error == 0) *conf = parse_cluster_conf(whole_lines({text.get(), length}));
     return error;
-}
-
-int read_machine_id(qn_uint64_t *id)
-{
-    char digits[node_id_digits];
-    size_t length = 0;
-    const int error = platform::read_file(machine_file, digits, &length);
-    if (error != 0) return error;
-    const auto number = parse_hexadecimal({digits, length});
-    if (length != node_id_digits || !number) return ENODATA;
-    *id = *number;
-    return 0;
 }
 } // namespace
 } // namespace qn::cu
@@ -60,5 +55,5 @@ int cu_get_node_id_1(qn_uint64_t *node_id)
         *node_id = *conf.node_id;
         return 0;
     }
-    return qn::cu::read_machine_id(node_id);
+    return qn::platform::read_machine_id(node_id);
 }

@@ -29,6 +29,13 @@ std::optional<number_type> parse_number(std::string_view digits, int base)
     return number;
 }
 
+// A number of 1 to 16 hexadecimal digits, with or without "0x".
+std::optional<qn_uint64_t> parse_hexadecimal(std::string_view digits)
+{
+    if (digits.starts_with("0x") || digits.starts_with("0X")) digits.remove_prefix(2);
+    return digits.size() <= 16 ? parse_number<qn_uint64_t>(digits, 16) : std::nullopt;
+}
+
 void store_text(std::string_view value, std::span<char> field)
 {
     value = value.substr(0, value.find('\0')).substr(0, field.size() - 1);
@@ -48,12 +55,6 @@ void store(std::string_view key, std::string_view value, cluster_conf &conf)
     }
 }
 } // namespace
-
-std::optional<qn_uint64_t> parse_hexadecimal(std::string_view digits)
-{
-    if (digits.starts_with("0x") || digits.starts_with("0X")) digits.remove_prefix(2);
-    return digits.size() <= 16 ? parse_number<qn_uint64_t>(digits, 16) : std::nullopt;
-}
 
 cluster_conf parse_cluster_conf(std::string_view text)
 {

@@ -14,7 +14,4 @@ struct cluster_conf {
 };
 
 cluster_conf parse_cluster_conf(std::string_view text);
-
-// A number of 1 to 16 hexadecimal digits, with or without "0x"; nothing else may stand in `digits`.
-std::optional<qn_uint64_t> parse_hexadecimal(std::string_view digits);
 } // namespace qn::cu

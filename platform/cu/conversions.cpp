@@ -2,6 +2,7 @@
 #include "platform/cu/conversions.h"
 
 #include <algorithm>
+#include <climits>
 
 namespace qn::cu
 {
@@ -27,7 +28,9 @@ public:
                 break;
             }
         }
-        for (const auto &kind : named_) found_.inserts.push_back(kind.value_or(unnamed));
+        for (const auto &kind : named_) found_.inserts.push_back({kind.value_or(unnamed), {}});
+        for (const conversion &one : found_.list)
+            if (one.letter == 's') found_.inserts[*one.insert].precisions.push_back(one.precision);
         return std::move(found_);
     }
 
@@ -38,10 +41,10 @@ private:
         one.begin = at_++;
         const std::optional<int> position = read_position();
         one.flags = read_any_of("-+ #0'");
-        if (!read_extent(one.width)) return false;
+        if (!read_extent(one.width, widest_conversion)) return false;
         if (take('.')) {
             const bool negative = take('-');
-            if (!read_extent(one.precision)) return false;
+            if (!read_extent(one.precision, INT_MAX)) return false; // a string's does not widen anything
             if (!one.precision.insert && !one.precision.number) one.precision.number = 0;
             if (negative) one.precision = {};
         }
@@ -60,24 +63,25 @@ private:
     std::optional<int> read_position()
     {
         const size_t before = at_;
-        const std::optional<int> number = read_number();
+        const std::optional<int> number = read_number(widest_conversion);
         if (number && take('$')) return number;
         at_ = before;
         return std::nullopt;
     }
 
-    std::optional<int> read_number()
+    // A number above `most` counts as that.
+    std::optional<int> read_number(int most)
     {
         if (!at_digit()) return std::nullopt;
-        int number = 0;
-        for (; at_digit(); ++at_) number = std::min(number * 10 + (text_[at_] - '0'), widest_conversion);
-        return number;
+        long number = 0;
+        for (; at_digit(); ++at_) number = std::min(number * 10 + (text_[at_] - '0'), long{most});
+        return static_cast<int>(number);
     }
 
-    bool read_extent(extent &found)
+    bool read_extent(extent &found, int most)
     {
         if (!take('*')) {
-            found.number = read_number();
+            found.number = read_number(most);
             return true;
         }
         return name_insert(read_position(), passed_as::integer, found.insert);

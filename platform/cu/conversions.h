@@ -15,7 +15,7 @@
 namespace qn::cu
 {
 constexpr int most_positions = 64;      // "%64$d" is the last position that counts
-constexpr int widest_conversion = 4095; // a larger width or precision counts as this one
+constexpr int widest_conversion = 4095; // a larger width, or precision of a number, counts as this one
 
 // How an insert is passed through the variable argument list.
 enum class passed_as { integer, long_integer, long_long, floating, long_double, text, wide_text, pointer };
@@ -43,10 +43,16 @@ struct conversion {
     passed_as kind = passed_as::integer;
 };
 
+// An insert that a text takes, whether it shows it once, more often or never.
+struct named_insert {
+    passed_as kind;
+    std::vector<extent> precisions; // of a string: that of each conversion that shows it, none included
+};
+
 struct text_conversions {
     std::vector<conversion> list;
-    std::vector<passed_as> inserts; // how each insert is passed, in argument order
-    bool understood = true;         // false: there is a '%' that makes no sense; the list ends before it
+    std::vector<named_insert> inserts; // in argument order
+    bool understood = true;            // false: there is a '%' that makes no sense; the list ends before it
 };
 
 text_conversions find_conversions(std::string_view text);

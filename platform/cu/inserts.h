@@ -1,5 +1,5 @@
 // Reading the inserts of a message from a variable argument list: exactly those that its text names, never one
-// more.
+// more, and of a string no more than the text may show.
 #pragma once
 
 #include <cstdarg>
@@ -15,10 +15,10 @@
 namespace qn::cu
 {
 struct insert_list {
-    std::vector<cu_error_arg_t> args; // strings are still the caller's, or in `narrowed`
-    std::deque<std::string> narrowed; // wide strings, turned into multibyte text
+    std::vector<cu_error_arg_t> args; // strings are still the caller's, or in `texts`
+    std::deque<std::string> texts;    // strings with a precision; wide strings, turned into multibyte text
 };
 
 // Replaces what `inserts` holds. May throw std::bad_alloc.
-void read_inserts(std::span<const passed_as> kinds, va_list arguments, insert_list &inserts);
+void read_inserts(std::span<const named_insert> named, va_list arguments, insert_list &inserts);
 } // namespace qn::cu

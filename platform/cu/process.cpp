@@ -22,6 +22,9 @@ namespace
 constexpr const char *group_file = "/etc/group";
 constexpr std::string_view admin_group = "qnadm:"; // how its line begins
 
+// No group has this number; chown() and its kin take it for "leave it as it is".
+constexpr gid_t no_group = std::numeric_limits<gid_t>::max();
+
 struct close_stream {
     void operator()(FILE *stream) const { std::fclose(stream); }
 };
@@ -33,7 +36,7 @@ bool number_in(const char *line, gid_t *gid)
     if (number == nullptr) return false;
     char *end = nullptr;
     const unsigned long value = std::strtoul(++number, &end, 10);
-    if (end == number || *end != ':' || value > std::numeric_limits<gid_t>::max()) return false;
+    if (end == number || *end != ':' || value >= no_group) return false;
     *gid = static_cast<gid_t>(value);
     return true;
 }

@@ -48,7 +48,7 @@ layout layout_of(const conversion &one, insert_span inserts)
     }
     found.width = static_cast<size_t>(std::min(width, widest_conversion));
     const std::optional<int> precision = value_of(one.precision, inserts);
-    if (precision && *precision >= 0) found.precision = static_cast<size_t>(std::min(*precision, widest_conversion));
+    if (precision && *precision >= 0) found.precision = static_cast<size_t>(*precision);
     return found;
 }
 
@@ -60,12 +60,32 @@ void append_padded(std::string &out, const layout &how, std::string_view text)
     if (how.left()) out.append(padding, ' ');
 }
 
-void append_string(std::string &out, const layout &how, const char *text)
+// How many of the first `most` bytes belong to characters that end in them. In the locale of the process; a byte that
+// has no meaning in it counts as a character.
+size_t whole_characters(const char *text, size_t most)
+{
+    size_t done = 0;
+    while (done < most && text[done] != '\0') {
+        std::mbstate_t state{};
+        const size_t found = std::mbrlen(text + done, strnlen(text + done, MB_LEN_MAX), &state);
+        const size_t bytes = found <= MB_LEN_MAX ? found : 1;
+        if (bytes > most - done) break;
+        done += bytes;
+    }
+    return done;
+}
+
+// A precision counts bytes; what was wide text is cut between its characters.
+size_t bytes_to_show(const char *text, std::optional<size_t> precision, passed_as kind)
+{
+    if (!precision) return std::strlen(text);
+    return kind == passed_as::wide_text ? whole_characters(text, *precision) : strnlen(text, *precision);
+}
+
+void append_string(std::string &out, const layout &how, passed_as kind, const char *text)
 {
     if (text == nullptr) text = "(null)";
-    // The largest precision stands for any larger one: it does not cut.
-    const bool cut = how.precision && *how.precision < widest_conversion;
-    append_padded(out, how, {text, cut ? strnlen(text, *how.precision) : std::strlen(text)});
+    append_padded(out, how, {text, bytes_to_show(text, how.precision, kind)});
 }
 
 void append_character(std::string &out, const layout &how, const conversion &one, int character)
@@ -88,7 +108,7 @@ void append_value(std::string &out, const layout &how, std::string_view length, 
 {
     std::string format = "%" + how.flags;
     if (how.width > 0) format += std::to_string(how.width);
-    if (how.precision) format += "." + std::to_string(*how.precision);
+    if (how.precision) format += "." + std::to_string(std::min(*how.precision, size_t{widest_conversion}));
     format += length;
     format += letter;
     const int bytes = std::snprintf(nullptr, 0, format.c_str(), value);
@@ -122,7 +142,7 @@ void append_conversion(std::string &out, const conversion &one, insert_span inse
     case CU_ERROR_ARG_LONG: return append_value(out, how, "l", one.letter, value.cu_long);
     case CU_ERROR_ARG_LONG_LONG: return append_value(out, how, "ll", one.letter, value.cu_long_long);
     case CU_ERROR_ARG_DOUBLE: return append_value(out, how, "", one.letter, value.cu_double);
-    case CU_ERROR_ARG_CHAR_STR: return append_string(out, how, value.cu_char_str);
+    case CU_ERROR_ARG_CHAR_STR: return append_string(out, how, one.kind, value.cu_char_str);
     case CU_ERROR_ARG_VOID_PTR: return append_pointer(out, how, value.cu_void_ptr);
     case CU_ERROR_ARG_RESERVED: return;
     }

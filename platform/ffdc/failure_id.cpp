@@ -5,7 +5,6 @@
 #include "platform/ffdc/failure_id.h"
 
 #include <atomic>
-#include <charconv>
 #include <cinttypes>
 #include <climits>
 #include <cstdio>
@@ -13,13 +12,12 @@
 #include <string_view>
 #include <unistd.h>
 
-#include "platform/common/files.h"
+#include "platform/common/machine_id.h"
 
 namespace qn::ffdc
 {
 namespace
 {
-constexpr const char *machine_file = "/etc/machine-id";
 constexpr unsigned number_bits = 10;
 
 constinit std::atomic<uint32_t> running_number{0};
@@ -34,14 +32,9 @@ uint64_t hash(std::string_view text)
 
 uint64_t host_number()
 {
-    char text[HOST_NAME_MAX + 1] = {};
-    size_t length = 0;
-    constexpr size_t digits = 16;
     uint64_t number = 0;
-    if (platform::read_file(machine_file, {text, digits}, &length) == 0) {
-        const auto [stopped, error] = std::from_chars(text, text + length, number, 16);
-        if (error == std::errc{} && stopped == text + digits) return number;
-    }
+    if (platform::read_machine_id(&number) == 0) return number;
+    char text[HOST_NAME_MAX + 1] = {};
     if (gethostname(text, sizeof text - 1) != 0) return 0;
     return hash(text);
 }

@@ -3,6 +3,8 @@
 #include <filesystem>
 #include <fstream>
 #include <string>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <gtest/gtest.h>
 #include <qn_cu.h>
@@ -151,6 +153,66 @@ TEST(Cluster, AFolderInPlaceOfTheFileIsAnError)
     }));
 }
 
+TEST(Cluster, APipeWithoutAWriterIsNotWaitedFor)
+{
+    EXPECT_TRUE(in_private_var([] {
+        std::filesystem::create_directories("/var/qn/cfg");
+        EXPECT_EQ(mkfifo("/var/qn/cfg/cluster.conf", 0600), 0);
+        alarm(20); // ends the test that hangs
+        cu_cluster_info_t info;
+        EXPECT_EQ(cu_get_cluster_info_1(&info), 0);
+        EXPECT_STREQ(info.cu_cluster_name, "");
+        return true;
+    }));
+}
+
+constexpr size_t most_bytes = 64 << 10;
+const std::string last_line = "node_number = 12345";
+
+// What is known of a file whose last line ends with that byte, and what follows the line.
+qn_int32_t node_number_ending_at(size_t byte, const std::string &behind)
+{
+    const std::string first_line = "cluster_name = big\n";
+    write_conf(first_line + std::string(byte - first_line.size() - last_line.size() - 1, '#') + "\n" + last_line +
+               behind);
+    cu_cluster_info_t info;
+    EXPECT_EQ(cu_get_cluster_info_1(&info), 0);
+    EXPECT_STREQ(info.cu_cluster_name, "big");
+    return info.cu_node_number;
+}
+
+TEST(Cluster, ALineThatCrossesTheEndOfWhatIsReadDoesNotCount)
+{
+    EXPECT_TRUE(in_private_var([] {
+        for (const size_t beyond : {1, 2, 5, 6, 18})
+            EXPECT_EQ(node_number_ending_at(most_bytes + beyond, "\nnode_number = 7\n"), 0) << beyond;
+        EXPECT_EQ(node_number_ending_at(most_bytes, "6"), 0);
+        return true;
+    }));
+}
+
+TEST(Cluster, ALineThatEndsWhereTheReadingEndsCounts)
+{
+    EXPECT_TRUE(in_private_var([] {
+        EXPECT_EQ(node_number_ending_at(most_bytes, ""), 12345);
+        EXPECT_EQ(node_number_ending_at(most_bytes, "\n"), 12345);
+        EXPECT_EQ(node_number_ending_at(most_bytes, "\nnode_number = 7\n"), 12345);
+        EXPECT_EQ(node_number_ending_at(most_bytes - 1, "\nnode_number = 7\n"), 12345);
+        return true;
+    }));
+}
+
+TEST(Cluster, AFileOfOneEndlessLineSaysNothing)
+{
+    EXPECT_TRUE(in_private_var([] {
+        write_conf("cluster_name = " + std::string(most_bytes * 2, 'x'));
+        cu_cluster_info_t info;
+        EXPECT_EQ(cu_get_cluster_info_1(&info), 0);
+        EXPECT_STREQ(info.cu_cluster_name, "");
+        return true;
+    }));
+}
+
 TEST(Cluster, TheFilesNodeIdIsPreferred)
 {
     EXPECT_TRUE(in_private_var([] {
@@ -197,6 +259,41 @@ TEST(Cluster, AFileWithoutANodeIdLeavesItToTheMachine)
     EXPECT_TRUE(in_private_var([] {
         write_conf("cluster_name = x\nnode_id = nonsense\n");
         expect_machine_id();
+        return true;
+    }));
+}
+
+// What cu_get_node_id_1 says where /etc/machine-id holds that text.
+struct node_id_answer {
+    int result;
+    qn_uint64_t id;
+    bool operator==(const node_id_answer &) const = default;
+};
+
+node_id_answer with_machine_id(const std::string &text)
+{
+    qn::test::use_machine_id(text);
+    node_id_answer answer{.result = -1, .id = 77};
+    answer.result = cu_get_node_id_1(&answer.id);
+    return answer;
+}
+
+TEST(Cluster, TheMachinesNodeIdIsMadeOfTheFirst16Digits)
+{
+    EXPECT_TRUE(in_private_var([] {
+        EXPECT_EQ(with_machine_id("0123456789abcdef0123456789abcdef\n"), (node_id_answer{0, 0x0123456789abcdefU}));
+        EXPECT_EQ(with_machine_id("FEDCBA9876543210"), (node_id_answer{0, 0xfedcba9876543210U}));
+        return true;
+    }));
+}
+
+TEST(Cluster, AMachineIdThatDoesNotBeginWith16HexadecimalDigitsIsNone)
+{
+    EXPECT_TRUE(in_private_var([] {
+        for (const char *text :
+             {"0x123456789012345678901234567890", "0X12345678901234", "", "\n", "0123456789abcde", "0123456789abcde\n",
+              " 0123456789abcdef", "-123456789abcdef", "+123456789abcdef", "0123456789abcdeg", "uninitialized\n"})
+            EXPECT_EQ(with_machine_id(text), (node_id_answer{ENODATA, 0})) << text;
         return true;
     }));
 }

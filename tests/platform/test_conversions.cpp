@@ -1,6 +1,8 @@
 // Which inserts a text names, and how each is passed.
 #include "platform/cu/conversions.h"
 
+#include <climits>
+
 #include <gtest/gtest.h>
 
 namespace
@@ -8,7 +10,12 @@ namespace
 using namespace qn::cu;
 using kinds = std::vector<passed_as>;
 
-kinds inserts_of(std::string_view text) { return find_conversions(text).inserts; }
+kinds inserts_of(std::string_view text)
+{
+    kinds found;
+    for (const named_insert &insert : find_conversions(text).inserts) found.push_back(insert.kind);
+    return found;
+}
 
 bool understood(std::string_view text) { return find_conversions(text).understood; }
 
@@ -126,8 +133,20 @@ TEST(Conversions, LengthsThatNoLetterHasAreRefused)
         EXPECT_FALSE(understood(wrong)) << wrong;
 }
 
+TEST(Conversions, AStringInsertHasThePrecisionOfEachConversionThatShowsIt)
+{
+    const auto inserts = find_conversions("%1$.7s %2$d %1$.*2$s %1$s").inserts;
+    ASSERT_EQ(inserts.size(), 2U);
+    ASSERT_EQ(inserts[0].precisions.size(), 3U);
+    EXPECT_EQ(inserts[0].precisions[0].number, 7);
+    EXPECT_EQ(inserts[0].precisions[1].insert, 1U);
+    EXPECT_FALSE(inserts[0].precisions[2].number || inserts[0].precisions[2].insert);
+    EXPECT_TRUE(inserts[1].precisions.empty());
+}
+
 TEST(Conversions, EndlessNumbersAreBounded)
 {
+    EXPECT_EQ(find_conversions("%.999999999999999999999999s").list.at(0).precision.number, INT_MAX);
     EXPECT_EQ(find_conversions("%999999999999999999999999d").list.at(0).width.number, widest_conversion);
 }
 } // namespace

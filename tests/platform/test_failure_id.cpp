@@ -11,6 +11,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/ffdc/failure_id.h"
+#include "support/private_var.h"
 
 namespace
 {
@@ -46,6 +47,27 @@ TEST(FailureId, TellsTimeAndProcess)
 }
 
 TEST(FailureId, NamesTheSameHostEachTime) { EXPECT_EQ(new_id().substr(0, 16), new_id().substr(0, 16)); }
+
+TEST(FailureId, BeginsWithTheFirst16DigitsOfTheMachineId)
+{
+    EXPECT_TRUE(qn::test::in_private_var([] {
+        qn::test::use_machine_id("fedcba98765432100123456789abcdef\n");
+        EXPECT_EQ(new_id().substr(0, 17), "fedcba9876543210.");
+        return true;
+    }));
+}
+
+TEST(FailureId, BeginsWithAnotherNumberWhereTheMachineIdIsNone)
+{
+    EXPECT_TRUE(qn::test::in_private_var([] {
+        qn::test::use_machine_id("0x12345678901234567890\n");
+        const std::string id = new_id();
+        EXPECT_NE(id.substr(0, 16), "0012345678901234");
+        EXPECT_NE(id.substr(0, 16), "0000000000000000");
+        EXPECT_EQ(id.substr(0, 16), new_id().substr(0, 16));
+        return true;
+    }));
+}
 
 TEST(FailureId, IsNeverGivenTwice)
 {

@@ -64,11 +64,13 @@ TEST(MessageText, StringsAreCutAndPadded)
     EXPECT_EQ(message("<%.0s>", "gone"), "<>");
 }
 
-TEST(MessageText, ALongStringIsNotCutByTheBoundOfThePrecision)
+TEST(MessageText, ALongStringIsCutToItsPrecisionOnly)
 {
-    const std::string longer(10000, 'x');
+    const std::string longer(6000, 'x');
     EXPECT_EQ(message("%s", longer.c_str()), longer);
-    EXPECT_EQ(message("%.9000s", longer.c_str()), longer);
+    for (const char *text : {"%.4094s", "%.4095s", "%.4096s", "%.5000s", "%.7000s", "%.2147483647s"})
+        expect_as_printf(text, longer.c_str());
+    expect_as_printf("%.*s", 5000, longer.c_str());
 }
 
 TEST(MessageText, ANullStringReadsAsSuch)
@@ -117,6 +119,26 @@ TEST(MessageText, WideCharactersBecomeMultibyteText)
     if (std::setlocale(LC_ALL, "C.UTF-8") == nullptr) GTEST_SKIP() << "no UTF-8 locale here";
     EXPECT_EQ(message("%ls|%S|%lc", L"gr\u00fcn", L"x", static_cast<wint_t>(0x20ac)), "gr\u00fcn|x|\u20ac");
     EXPECT_EQ(message("%ls %d", static_cast<const wchar_t *>(nullptr), 3), "(null) 3");
+}
+
+TEST(MessageText, APrecisionCutsWideTextBetweenCharacters)
+{
+    if (std::setlocale(LC_ALL, "C.UTF-8") == nullptr) GTEST_SKIP() << "no UTF-8 locale here";
+    for (const char *text : {"<%.0ls>", "<%.1ls>", "<%.2ls>", "<%.3ls>", "<%.4ls>", "<%.6ls>", "<%.9ls>", "<%-6.4ls>"})
+        expect_as_printf(text, L"\u20ac\u20acx");
+    expect_as_printf("<%.*ls>", 5, L"x\u20acx");
+}
+
+TEST(MessageText, WideTextThatIsShownTwiceIsCutForEachConversion)
+{
+    if (std::setlocale(LC_ALL, "C.UTF-8") == nullptr) GTEST_SKIP() << "no UTF-8 locale here";
+    EXPECT_EQ(message("%1$.2ls|%1$.5ls|%1$ls", L"\u20ac\u20ac"), "|\u20ac|\u20ac\u20ac");
+}
+
+TEST(MessageText, OfWideTextOnlyWhatIsShownMustExistInTheLocale)
+{
+    std::setlocale(LC_ALL, "C");
+    EXPECT_EQ(message("<%.1ls> %d", L"x\u20ac", 3), "<x> 3");
 }
 
 TEST(MessageText, WideTextThatTheLocaleDoesNotHaveIsEmpty)

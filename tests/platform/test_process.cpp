@@ -140,6 +140,20 @@ TEST(AdministrativeGroup, IsNoGroupWhoseLineIsMalformedOrWhoseNameOnlyBeginsLike
                             }));
 }
 
+TEST(AdministrativeGroup, HasNoNumberThatMeansNoGroup)
+{
+    EXPECT_TRUE(with_groups("qnadm:x:4294967295:\n", [] {
+        gid_t gid = 77;
+        EXPECT_EQ(cu_getadmin_group_id_1(&gid), ENOENT);
+        EXPECT_EQ(gid, 77U);
+    }));
+    EXPECT_TRUE(with_groups("qnadm:x:4294967294:\n", [] {
+        gid_t gid = 77;
+        EXPECT_EQ(cu_getadmin_group_id_1(&gid), 0);
+        EXPECT_EQ(gid, 4294967294U);
+    }));
+}
+
 // A name in the middle of a line that is longer than what is read at a time is none.
 TEST(AdministrativeGroup, IsFoundAtTheStartOfALineOnly)
 {

@@ -10,8 +10,7 @@ namespace qn::test
 inline const std::string any_call = "any";
 
 // Runs `body` in a thread of its own, which hangs in the call of that name, made for the `count`-th time in `body`, and
-// is cancelled there. "open", "read", "write", "close", "fopen", "fsync", "msync", "usleep", "syslog", "vsyslog" or
-// any_call.
+// is cancelled there. "open", "read", "write", "close", "fsync", "msync", "usleep", "syslog", "vsyslog" or any_call.
 // True when the thread came there and its cancellation was its end.
 bool cancelled_in(const std::string &call, const std::function<void()> &body, int count = 1);
 } // namespace qn::test

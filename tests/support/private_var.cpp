@@ -4,10 +4,13 @@
 #include <fcntl.h>
 #include <sched.h>
 #include <sys/mount.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
+
+#include "support/scratch.h"
 
 namespace
 {
@@ -55,5 +58,13 @@ bool in_private_var(const std::function<bool()> &body)
         return true;
     }
     return WIFEXITED(status) && WEXITSTATUS(status) == 0;
+}
+
+void use_machine_id(const std::string &text)
+{
+    const bool first_time = mkdir("/var/etc", 0755) == 0;
+    write_file("/var/etc/machine-id", text);
+    if (!first_time) return;
+    EXPECT_EQ(mount("/var/etc", "/etc", nullptr, MS_BIND, nullptr), 0);
 }
 } // namespace qn::test

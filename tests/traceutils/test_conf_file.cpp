@@ -4,6 +4,8 @@
 
 #include <gtest/gtest.h>
 #include <pthread.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include "support/last_error.h"
 #include "support/private_var.h"
@@ -62,6 +64,17 @@ TEST(ConfFile, AFileThatCannotBeReadToItsEndIs48)
 {
     const scratch files;
     EXPECT_EQ(read_conf_of(files.folder()).status, 48);
+}
+
+TEST(ConfFile, APipeWithoutAWriterIsEmpty)
+{
+    const scratch files;
+    ASSERT_EQ(mkfifo((files / "pipe").c_str(), 0600), 0);
+    alarm(20); // ends the test that hangs
+    const conf_seen seen = read_conf_of(files / "pipe");
+    EXPECT_EQ(seen.status, 0);
+    EXPECT_TRUE(seen.chunks.empty());
+    alarm(0);
 }
 
 TEST(ConfFile, NothingStaysOpen)

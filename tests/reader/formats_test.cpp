@@ -68,7 +68,7 @@ TEST(Formats, JsonShowsTheHeaderAndEveryKindOldestFirst)
 {
     EXPECT_EQ(
         json_of(every_kind().bytes(), {.with_header = true}),
-        R"({"type":"header","file":"test.trc","version":6,"byte_order":"little","platform":2,"build":"builder 1","pid":4711,"program":"/opt/app/bin/app -v","base_program":"app","node_number":0,"node_id":"43981","file_size":4096,"time_base":{"ticks_per_second":"1000000000","epoch_ns":"1795237920000000000"},"tz_offset_minutes":0,"page_state":0,"page_reuse_time":0}
+        R"({"type":"header","file":"test.trc","version":6,"byte_order":"little","platform":2,"build":"builder 1","pid":4711,"program":"/opt/app/bin/app -v","base_program":"app","node_number":0,"node_id":"000000000000abcd","file_size":4096,"time_base":{"ticks_per_second":"1000000000","epoch_ns":"1795237920000000000"},"tz_offset_minutes":0,"page_state":0,"page_reuse_time":0}
 {"type":"record","time":"2026-11-21T05:12:01.123456789Z","time_ns":"1795237921123456789","seq":0,"thread":32513,"comp":"____","kind":"note","text":"SPOOL: app.1.sp not spooled 2 consecutive times"}
 {"type":"record","time":"2026-11-21T05:12:01.123457789Z","time_ns":"1795237921123457789","seq":2,"thread":32513,"comp":"____","kind":"start","pid":4711,"time_base":{"ticks_per_second":"1000000000","epoch_ns":"1795237920000000000"}}
 {"type":"record","time":"2026-11-21T05:12:01.123458789Z","time_ns":"1795237921123458789","seq":4,"thread":32513,"comp":"IDX","kind":"id","id":17}
@@ -126,7 +126,7 @@ TEST(Formats, RawJsonAddsHeaderFieldsFillersAndUnfinishedRecords)
     const auto json = json_of(every_kind().bytes(), {.raw = true, .with_header = true});
     EXPECT_EQ(
         json.substr(0, json.find('\n') + 1),
-        R"({"type":"header","file":"test.trc","version":6,"byte_order":"little","platform":2,"build":"builder 1","pid":4711,"program":"/opt/app/bin/app -v","base_program":"app","node_number":0,"node_id":"43981","file_size":4096,"time_base":{"ticks_per_second":"1000000000","epoch_ns":"1795237920000000000"},"tz_offset_minutes":0,"page_state":0,"page_reuse_time":0,"properties":192,"flags":0,"ring_offset":200,"oldest_record_offset":1204,"seq_lock":1,"tail_request":0,"machine_id":0}
+        R"({"type":"header","file":"test.trc","version":6,"byte_order":"little","platform":2,"build":"builder 1","pid":4711,"program":"/opt/app/bin/app -v","base_program":"app","node_number":0,"node_id":"000000000000abcd","file_size":4096,"time_base":{"ticks_per_second":"1000000000","epoch_ns":"1795237920000000000"},"tz_offset_minutes":0,"page_state":0,"page_reuse_time":0,"properties":192,"flags":0,"ring_offset":200,"oldest_record_offset":1204,"seq_lock":1,"tail_request":0,"machine_id":0}
 )");
     EXPECT_EQ(
         lines_with(json, "\"kind\":\"free\""),

@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
+#include "reader/every_kind.h"
 #include "reader/spool_directory.h"
 #include "reader/trace_set_files.h"
 
@@ -132,6 +133,20 @@ TEST(Merge, SelectsRecords)
     const scratch_folder folder;
     const auto path = folder.file("a.trc", ids_from(1, {1, 2, 3, 4}).bytes());
     EXPECT_EQ(merged_ids({"--where", "id >= 2 && id != 3", path}), (ids{2, 4}));
+}
+
+TEST(Merge, AnErrorNamesItsTraceFileBesideTheSourceFileThatItIsAbout)
+{
+    const scratch_folder folder;
+    const auto path = folder.file("every.trc", every_kind().bytes());
+    for (const auto &object : rows(run_qntrace({"merge", "--json", path}))) {
+        EXPECT_EQ(object.at("path"), path);
+        if (object.at("kind") == "error") {
+            EXPECT_NE(object.at("file"), path);
+        } else {
+            EXPECT_FALSE(object.contains("file"));
+        }
+    }
 }
 
 TEST(Merge, KeepsTheOrderOfTheRingWhereItsClockStepsBackAndSaysSo)

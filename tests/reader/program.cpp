@@ -1,5 +1,6 @@
 #include "reader/program.h"
 
+#include <algorithm>
 #include <csignal>
 #include <cstdlib>
 #include <filesystem>
@@ -49,6 +50,7 @@ void open_as(int descriptor, const std::string &path)
         open_as(STDOUT_FILENO, out);
     }
     if (around.ignore_sigpipe) std::signal(SIGPIPE, SIG_IGN);
+    for (const int descriptor : around.closed) close(descriptor);
     if (around.as_nobody && geteuid() == 0 && (setgid(65534) != 0 || setuid(65534) != 0)) _exit(126);
     execve(program.c_str(), pointers_to(arguments).data(), pointers_to(around.environment).data());
     _exit(127);
@@ -60,7 +62,7 @@ outcome run_program(const std::string &program, const std::vector<std::string> &
 {
     const scratch_folder folder;
     const auto out = around.out_file.empty() ? folder.path("out") : around.out_file;
-    const auto err = folder.path("err");
+    const auto err = around.err_file.empty() ? folder.path("err") : around.err_file;
     const pid_t child = fork();
     if (child < 0) throw std::runtime_error("fork() failed");
     if (child == 0) become(program, arguments, around, out, err);
@@ -70,7 +72,7 @@ outcome run_program(const std::string &program, const std::vector<std::string> &
     if (WIFEXITED(status)) result.status = WEXITSTATUS(status);
     if (WIFSIGNALED(status)) result.signal = WTERMSIG(status);
     if (around.out_file.empty() && !around.nobody_reads) result.out = contents_of(out);
-    result.err = contents_of(err);
+    if (around.err_file.empty()) result.err = contents_of(err);
     return result;
 }
 
@@ -106,6 +108,11 @@ std::string contents_of(const std::string &path)
     std::ifstream in(path, std::ios::binary);
     if (!in) throw std::runtime_error(path + " cannot be read");
     return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+}
+
+bool is_ascii(std::string_view text)
+{
+    return std::all_of(text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < 0x80; });
 }
 
 } // namespace qn::test

@@ -22,7 +22,9 @@ struct surroundings {
     bool as_nobody = false;      // gives up root's rights, if the test has them
     bool ignore_sigpipe = false; // as a careless parent leaves it
     std::string out_file;        // instead of catching standard output
+    std::string err_file;        // instead of catching standard error
     bool nobody_reads = false;   // standard output is a pipe without a reader
+    std::vector<int> closed;     // descriptors that are not open when the program starts
 };
 
 outcome run_program(const std::string &program, const std::vector<std::string> &arguments,
@@ -47,5 +49,6 @@ private:
 };
 
 std::string contents_of(const std::string &path);
+bool is_ascii(std::string_view text);
 
 } // namespace qn::test

@@ -250,6 +250,25 @@ TEST(SpoolCommand, EscapesTheNamesOfFoldersAndTraces)
     EXPECT_NE(shown.out.find("\nh\\x1b[2J/0000000000000001  p\\n      t\\x07 "), std::string::npos) << shown.out;
 }
 
+TEST(SpoolCommand, WritesJsonInAscii)
+{
+    const spool_directory spool;
+    spool.put("b\xc3\xbcro/0000000000000001/app", "a.1.sp.2026_11_21_05_13_00.123456", two_records());
+    const auto shown = run_qntrace({"spool", "--json", spool.root});
+    EXPECT_TRUE(is_ascii(shown.out)) << shown.out;
+    EXPECT_EQ(rows(shown).at(0)["host"], "b\xc3\xbcro");
+}
+
+TEST(SpoolCommand, KeepsEveryByteOfNamesThatAreNoUtf8InJson)
+{
+    const spool_directory spool;
+    spool.put("b\xfcro/0000000000000001/app", "a.1.sp.2026_11_21_05_13_00.123456", two_records());
+    const auto found = sound_rows({spool.root});
+    ASSERT_EQ(found.size(), 1U);
+    EXPECT_EQ(found[0].at("encoding"), "latin-1");
+    EXPECT_EQ(found[0]["host"], "b\xc3\xbcro");
+}
+
 // The body is run with an empty /var that the test may fill.
 void in_empty_var(const std::function<void()> &body)
 {

@@ -50,6 +50,21 @@ trace_builder mixed()
     return file;
 }
 
+TEST(Stats, KeepsEveryByteOfComponentsThatAreNoUtf8InJson)
+{
+    const scratch_folder folder;
+    trace_builder file;
+    file.component = "I\xe4X";
+    file.add_id(1);
+    file.close();
+    const auto shown = run_qntrace({"stats", "--json", folder.file("a.trc", file.bytes())});
+    EXPECT_TRUE(is_ascii(shown.out)) << shown.out;
+    const auto objects = rows(shown);
+    ASSERT_GE(objects.size(), 2U);
+    EXPECT_EQ(objects[1].at("comp"), "I\xc3\xa4X");
+    EXPECT_EQ(objects[1].at("encoding"), "latin-1");
+}
+
 TEST(Stats, CountsRecordsBytesAndTimes)
 {
     const scratch_folder folder;

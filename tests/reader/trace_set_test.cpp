@@ -79,7 +79,7 @@ TEST(TraceSet, NamesNodeProgramTraceAndFileOfEveryRecord)
     EXPECT_EQ(found[0]["node_id"], "000000000000002a");
     EXPECT_EQ(found[0]["program"], "app"); // its header's base name; the folder's may be that of a link
     EXPECT_EQ(found[0]["trace"], "app.trc");
-    EXPECT_EQ(found[0]["file"], path);
+    EXPECT_EQ(found[0]["path"], path);
 }
 
 TEST(TraceSet, ACopyNamedByItselfIsKnownByItsFolders)
@@ -150,7 +150,7 @@ TEST_P(PageState, DoesNotMatterForAPageThatHasACopy)
     page.put_u8(offset_of_page_state, static_cast<std::uint8_t>(GetParam()));
     const auto live = spool.folder.file("app.trc.1.sp", page.bytes());
     const auto found = sound_objects("merge", {live, spool.root});
-    EXPECT_EQ(texts_of(found, "file"), (strings{copy, copy, copy}));
+    EXPECT_EQ(texts_of(found, "path"), (strings{copy, copy, copy}));
 }
 
 TEST_P(PageState, DoesNotMatterForAPageThatHasNone)
@@ -178,7 +178,7 @@ TEST(TraceSet, ACopyInTheMakingGivesWayToItsPage)
     const auto live = spool.folder.file("app.trc.1.sp", page.bytes());
     page.put_u32(200 + 2 * 32, 0); // nothing of the third record is there yet
     spool.put(copy_of("app.trc.1.sp"), page);
-    EXPECT_EQ(texts_of(sound_objects("merge", {spool.root, live}), "file"), (strings{live, live, live}));
+    EXPECT_EQ(texts_of(sound_objects("merge", {spool.root, live}), "path"), (strings{live, live, live}));
 }
 
 TEST(TraceSet, AFileWithMoreFinishedRecordsIsTheBetterOne)

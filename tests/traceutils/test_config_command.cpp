@@ -45,6 +45,13 @@ json only_section_of(const std::string &text)
     return sections.empty() ? json::object() : sections[0];
 }
 
+TEST(ConfigCommand, KeepsEveryByteOfValuesThatAreNoUtf8InJson)
+{
+    const json section = only_section_of("t:\npat = /x\ndest = /b\xfcro\n");
+    EXPECT_EQ(section.at("encoding"), "latin-1");
+    EXPECT_EQ(section.at("dest"), "/b\xc3\xbcro");
+}
+
 TEST(ConfigCommand, ShowsATraceSectionAsTheSpoolerTakesIt)
 {
     const json section = only_section_of("# note\nt:\npat = /x.*\nspooling = on\ndest = /d\ntracesize = 8388609\n");

@@ -21,6 +21,7 @@
 #include "tools/qntrace/console/findings.h"
 #include "tools/qntrace/console/output.h"
 #include "tools/qntrace/format/escape.h"
+#include "tools/qntrace/format/json_text.h"
 #include "trace/files/compiled_pattern.h"
 #include "trace/spooling/spool_shape.h"
 #include "trace/traceutils/traceutils.h"
@@ -225,14 +226,20 @@ std::string text_of(const section_report &section)
     return out;
 }
 
-// Bytes that are no UTF-8 are replaced, as `info` does it.
 std::string json_of(const section_report &section)
 {
-    json object = {{"type", section.type}, {"section", section.name}, {"line", section.line}};
-    for (const field &each : section.fields) object[each.member] = each.value;
-    if (!section.fault.empty()) object["fault"] = section.fault;
-    if (!section.notes.empty()) object["notes"] = section.notes;
-    return object.dump(-1, ' ', true, json::error_handler_t::replace) + '\n';
+    std::string line;
+    append_object(line, [&](text_encoder &encode) {
+        json object = {{"type", section.type}};
+        object["section"] = encode.text(section.name);
+        object["line"] = section.line;
+        for (const field &each : section.fields)
+            object[each.member] = each.value.is_string() ? encode.text(each.value.get<std::string>()) : each.value;
+        if (!section.fault.empty()) object["fault"] = encode.text(section.fault);
+        for (const std::string &note : section.notes) object["notes"].push_back(encode.text(note));
+        return object;
+    });
+    return line;
 }
 
 // Why a file of that name cannot be read; empty when it was.

@@ -1,9 +1,5 @@
 // qntrace info: what a trace file is and what it holds, without its records.
-//
-// Who wrote it is asked through the library's query interface; everything else comes from the reading core, which walks
-// the ring once.
 #include <algorithm>
-#include <cstdlib>
 #include <memory>
 #include <optional>
 #include <string>
@@ -11,12 +7,12 @@
 
 #include <fmt/format.h>
 #include <nlohmann/json.hpp>
-#include <qn_tr.h>
 
 #include "tools/qntrace/commands.h"
 #include "tools/qntrace/console/findings.h"
 #include "tools/qntrace/console/output.h"
 #include "tools/qntrace/format/escape.h"
+#include "tools/qntrace/format/json_text.h"
 #include "tools/qntrace/format/record_names.h"
 #include "tools/qntrace/format/timestamps.h"
 #include "tools/qntrace/reader/reader.h"
@@ -34,12 +30,6 @@ struct info_options {
     std::vector<std::string> files;
 };
 
-struct query_answer {
-    pid_t pid = 0;
-    std::string program;
-    std::uint32_t platform = 0;
-};
-
 // The first or last record that carries data.
 struct record_seen {
     std::uint32_t sequence = 0;
@@ -53,39 +43,6 @@ struct ring_contents {
     std::optional<record_seen> oldest;
     std::optional<record_seen> newest;
 };
-
-// The calling thread's error, as the library words it.
-std::string library_message()
-{
-    cu_error_t *error = nullptr;
-    char *text = nullptr;
-    std::string message = "the query failed";
-    if (cu_get_error_1(&error) == 0 && cu_get_errmsg_1(error, &text) == 0) message = text;
-    std::free(text);
-    cu_rel_error_1(error);
-    while (message.ends_with('\n')) message.pop_back();
-    return message;
-}
-
-// Nothing when the library cannot open the file; `status` says then how bad that is.
-std::optional<query_answer> ask_library(const std::string &path, int &status)
-{
-    tr_query_handle_t handle = nullptr;
-    const int opened = tr_open_query_1(path.c_str(), &handle);
-    if (opened != 0) {
-        write_message(fmt::format("{}: {}", printable_name(path), library_message()));
-        status = opened == QN_TR_ENOTTRACE ? status_damaged : status_io_error;
-        return std::nullopt;
-    }
-    query_answer answer;
-    qn_char_t *program = nullptr;
-    tr_query_pid_1(handle, &answer.pid);
-    tr_query_platform_1(handle, &answer.platform);
-    if (tr_query_prog_1(handle, &program) == 0) answer.program = program;
-    std::free(program);
-    tr_close_query_1(handle);
-    return answer;
-}
 
 // A ring's sequence numbers start at 2 and go up by 2, so that the oldest one tells how many came before it: records that
 // were overwritten, and the fillers that closed off the end of the file each time it was reached.
@@ -131,16 +88,15 @@ class info_text
 public:
     explicit info_text(bool utc) : times_(utc) {}
 
-    std::string of(const std::string &path, const query_answer &who, const reader::file_header &header,
-                   const ring_contents &contents)
+    std::string of(const std::string &path, const reader::file_header &header, const ring_contents &contents)
     {
         std::string out;
         line(out, "file", printable_name(path));
-        line(out, "process", fmt::format("{}", who.pid));
-        line(out, "program", escaped(who.program));
+        line(out, "process", fmt::format("{}", header.pid));
+        line(out, "program", escaped(header.program.value_or("")));
         line(out, "base name", escaped(header.base_program.value_or("")));
         line(out, "build", escaped(header.build_name.value_or("")));
-        line(out, "platform", fmt::format("{}", who.platform));
+        line(out, "platform", fmt::format("{}", header.platform));
         line(out, "format", fmt::format("version {}", header.version));
         line(out, "node", fmt::format("number {}, id {:#018x}", header.node_number, header.node_id.value_or(0)));
         line(out, "size",
@@ -182,40 +138,41 @@ json record_json(const record_seen &seen, timestamps &times)
     return record;
 }
 
-// Bytes that are no UTF-8 are replaced: the names here are for people, `dump --json` keeps every byte.
-std::string info_json(const std::string &path, const query_answer &who, const reader::file_header &header,
-                      const ring_contents &contents, bool utc)
+std::string info_json(const std::string &path, const reader::file_header &header, const ring_contents &contents,
+                      bool utc)
 {
     timestamps times(utc);
-    json info = {{"type", "info"},
-                 {"file", path},
-                 {"pid", who.pid},
-                 {"program", who.program},
-                 {"base_program", header.base_program.value_or("")},
-                 {"build", header.build_name.value_or("")},
-                 {"platform", who.platform},
-                 {"version", header.version},
-                 {"node_number", header.node_number},
-                 {"node_id", fmt::format("{:016x}", header.node_id.value_or(0))},
-                 {"file_bytes", header.file_size},
-                 {"ring_bytes", header.ring.end - header.ring.begin},
-                 {"ticks_per_second", fmt::format("{}", header.time_info.timeinfo1)},
-                 {"ns_at_tick_0", fmt::format("{}", static_cast<std::int64_t>(header.time_info.timeinfo2))},
-                 {"page_state", header.page_state.value_or(0)},
-                 {"records", contents.records},
-                 {"lost", contents.lost},
-                 {"unfinished", contents.unfinished}};
-    if (header.tz_offset_minutes) info["zone_minutes_west"] = *header.tz_offset_minutes;
-    if (contents.oldest) info["oldest"] = record_json(*contents.oldest, times);
-    if (contents.newest) info["newest"] = record_json(*contents.newest, times);
-    return info.dump(-1, ' ', false, json::error_handler_t::replace) + "\n";
+    std::string line;
+    append_object(line, [&](text_encoder &encode) {
+        json info = {{"type", "info"}};
+        info["file"] = encode.text(path);
+        info["pid"] = header.pid;
+        info["program"] = encode.text(header.program.value_or(""));
+        info["base_program"] = encode.text(header.base_program.value_or(""));
+        info["build"] = encode.text(header.build_name.value_or(""));
+        info["platform"] = header.platform;
+        info["version"] = header.version;
+        info["node_number"] = header.node_number;
+        info["node_id"] = fmt::format("{:016x}", header.node_id.value_or(0));
+        info["file_bytes"] = header.file_size;
+        info["ring_bytes"] = header.ring.end - header.ring.begin;
+        info["ticks_per_second"] = fmt::format("{}", header.time_info.timeinfo1);
+        info["ns_at_tick_0"] = fmt::format("{}", static_cast<std::int64_t>(header.time_info.timeinfo2));
+        info["page_state"] = header.page_state.value_or(0);
+        info["records"] = contents.records;
+        info["lost"] = contents.lost;
+        info["unfinished"] = contents.unfinished;
+        if (header.tz_offset_minutes) info["zone_minutes_west"] = *header.tz_offset_minutes;
+        if (contents.oldest) info["oldest"] = record_json(*contents.oldest, times);
+        if (contents.newest) info["newest"] = record_json(*contents.newest, times);
+        return info;
+    });
+    return line;
 }
 
 int show_file(const std::string &path, const info_options &options, bool first)
 {
     int status = status_sound;
-    const auto who = ask_library(path, status);
-    if (!who) return status;
     finding_printer findings(path);
     try {
         reader::file_source source(path);
@@ -223,10 +180,10 @@ int show_file(const std::string &path, const info_options &options, bool first)
         if (trace.header()) {
             const ring_contents contents = look_through(trace);
             if (options.json) {
-                write_data(info_json(path, *who, *trace.header(), contents, options.utc));
+                write_data(info_json(path, *trace.header(), contents, options.utc));
             } else {
                 if (!first) write_data("\n");
-                write_data(info_text(options.utc).of(path, *who, *trace.header(), contents));
+                write_data(info_text(options.utc).of(path, *trace.header(), contents));
             }
         }
     } catch (const reader::io_error &error) {

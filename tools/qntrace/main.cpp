@@ -5,7 +5,7 @@
 #include <clocale>
 #include <csignal>
 #include <exception>
-#include <iostream>
+#include <sstream>
 #include <stdexcept>
 
 #include <fmt/format.h>
@@ -40,7 +40,12 @@ int run(int argc, char **argv)
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError &error) {
-        const bool asked_for = app.exit(error, std::cout, std::cerr) == 0;
+        std::ostringstream data;
+        std::ostringstream messages;
+        const bool asked_for = app.exit(error, data, messages) == 0;
+        qn::dump::write_data(data.str());
+        qn::dump::flush_data();
+        qn::dump::write_error_text(messages.str());
         return asked_for ? qn::dump::status_sound : qn::dump::status_usage;
     } catch (const std::invalid_argument &error) { // arguments that a command cannot do anything with
         qn::dump::write_message(error.what());
@@ -57,11 +62,12 @@ int main(int argc, char **argv)
     std::signal(SIGPIPE, SIG_DFL);
     std::setlocale(LC_CTYPE, "");
     std::setlocale(LC_MESSAGES, ""); // whose message catalogues are taken
+    qn::dump::occupy_standard_descriptors();
     try {
         return run(argc, argv);
     } catch (const std::exception &error) {
         // Not through write_message(), which would write the data first that may be what has failed.
-        fmt::print(stderr, "qntrace: {}\n", error.what());
+        qn::dump::write_error_text(fmt::format("qntrace: {}\n", error.what()));
         return qn::dump::status_io_error;
     }
 }

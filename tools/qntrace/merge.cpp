@@ -82,11 +82,7 @@ class merge_json
 public:
     merge_json(const std::vector<trace_source> &sources, bool utc) : format_({false, utc})
     {
-        for (const trace_source &source : sources) {
-            text_members origin = origin_members(source);
-            origin.emplace_back("file", source.path);
-            origins_.push_back(std::move(origin));
-        }
+        for (const trace_source &source : sources) origins_.push_back(origin_with_path(source));
     }
 
     void record(std::string &out, std::size_t source, const reader::trace_record &record)

@@ -63,6 +63,16 @@ TEST(Check, TellsUnderADamagedFileWhatIsWrongWhereAndWhatIsLeft)
                      "  offset 232: record length 4294967295 is not a multiple of 4, behind sequence number 2\n");
 }
 
+TEST(Check, KeepsEveryByteOfANameThatIsNoUtf8InJson)
+{
+    const scratch_folder folder;
+    const auto shown = check({"--json", folder.file("b\xfcro.trc", sound().bytes())});
+    EXPECT_TRUE(is_ascii(shown.out)) << shown.out;
+    const auto object = nlohmann::json::parse(shown.out);
+    EXPECT_EQ(object.at("encoding"), "latin-1");
+    EXPECT_EQ(object["file"], folder.path("b\xc3\xbcro.trc"));
+}
+
 TEST(Check, PrintsAJsonObjectForAFile)
 {
     const scratch_folder folder;

@@ -4,6 +4,7 @@
 #include <nlohmann/json.hpp>
 
 #include "tools/qntrace/console/findings.h"
+#include "tools/qntrace/format/json_text.h"
 #include "tools/qntrace/format/timestamps.h"
 
 namespace qn::dump
@@ -50,13 +51,13 @@ const char *severity_name(reader::finding::severity level)
     return "damage";
 }
 
-json finding_object(const placed_finding &found)
+json finding_object(const placed_finding &found, text_encoder &encode)
 {
     json object = {{"severity", severity_name(found.what.level)}};
     if (found.what.offset) object["offset"] = *found.what.offset;
     if (found.what.seq) object["seq"] = *found.what.seq;
     if (found.behind) object["behind_seq"] = *found.behind;
-    object["text"] = found.what.text;
+    object["text"] = encode.text(found.what.text);
     return object;
 }
 
@@ -86,26 +87,29 @@ std::string check_text(const std::string &path, const file_check &checked, bool 
     return out;
 }
 
-// Bytes of a name that are no UTF-8 are replaced.
 std::string check_json(const std::string &path, const file_check &checked, bool utc)
 {
     timestamps times(utc);
-    json object = {{"type", "check"},
-                   {"file", path},
-                   {"status", checked.sound() ? "sound" : "damaged"},
-                   {"readable", checked.readable},
-                   {"records", checked.records}};
-    add_time(object, "first", checked.first_time, times);
-    add_time(object, "last", checked.last_time, times);
-    object["ring_bytes"] = checked.ring_bytes;
-    object["unreadable_bytes"] = checked.unreadable_bytes;
-    object["unfinished"] = checked.lost.unfinished;
-    object["missing"] = checked.lost.missing;
-    object["unspooled_pages"] = checked.lost.unspooled;
-    object["findings"] = json::array();
-    for (const auto &found : checked.findings) object["findings"].push_back(finding_object(found));
-    object["more_findings"] = checked.more_findings;
-    return object.dump(-1, ' ', true, json::error_handler_t::replace) + "\n";
+    std::string line;
+    append_object(line, [&](text_encoder &encode) {
+        json object = {{"type", "check"}};
+        object["file"] = encode.text(path);
+        object["status"] = checked.sound() ? "sound" : "damaged";
+        object["readable"] = checked.readable;
+        object["records"] = checked.records;
+        add_time(object, "first", checked.first_time, times);
+        add_time(object, "last", checked.last_time, times);
+        object["ring_bytes"] = checked.ring_bytes;
+        object["unreadable_bytes"] = checked.unreadable_bytes;
+        object["unfinished"] = checked.lost.unfinished;
+        object["missing"] = checked.lost.missing;
+        object["unspooled_pages"] = checked.lost.unspooled;
+        object["findings"] = json::array();
+        for (const auto &found : checked.findings) object["findings"].push_back(finding_object(found, encode));
+        object["more_findings"] = checked.more_findings;
+        return object;
+    });
+    return line;
 }
 
 } // namespace qn::dump

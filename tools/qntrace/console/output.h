@@ -30,4 +30,12 @@ void flush_data();
 // Writes "qntrace: MESSAGE" to standard error, behind the data written so far. The message is printed as it is.
 void write_message(std::string_view message);
 
+// Writes to standard error. Whether that can be written is ignored: there is nowhere left to tell it, and the exit
+// status is about the files.
+void write_error_text(std::string_view text);
+
+// Puts something that can be neither read nor written in the place of those of the descriptors 0, 1 and 2 that are
+// closed. Otherwise the next file that is opened would become standard output or standard error.
+void occupy_standard_descriptors();
+
 } // namespace qn::dump

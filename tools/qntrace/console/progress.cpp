@@ -5,6 +5,8 @@
 #include <fmt/format.h>
 #include <unistd.h>
 
+#include "tools/qntrace/console/output.h"
+
 namespace qn::dump
 {
 namespace
@@ -31,12 +33,12 @@ void progress_line::show(std::uint64_t records, std::uint64_t bytes_done)
     shown_ = true;
     const std::uint64_t done = std::min(bytes_done, total_bytes_);
     const auto percent = static_cast<unsigned>(100.0 * static_cast<double>(done) / static_cast<double>(total_bytes_));
-    fmt::print(stderr, "\r\x1b[K{:3}%  {} records", percent, records);
+    write_error_text(fmt::format("\r\x1b[K{:3}%  {} records", percent, records));
 }
 
 void progress_line::clear()
 {
-    if (shown_) fmt::print(stderr, "\r\x1b[K");
+    if (shown_) write_error_text("\r\x1b[K");
     shown_ = false;
 }
 

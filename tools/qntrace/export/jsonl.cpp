@@ -4,25 +4,18 @@
 #include <optional>
 #include <utility>
 
-#include <nlohmann/json.hpp>
-
 #include "tools/qntrace/console/output_file.h"
 #include "tools/qntrace/export/format.h"
 #include "tools/qntrace/export/tree.h"
 #include "tools/qntrace/format/json.h"
+#include "tools/qntrace/format/json_text.h"
+#include "tools/qntrace/traces/losses_json.h"
 #include "tools/qntrace/traces/origin_members.h"
 
 namespace qn::dump
 {
 namespace
 {
-
-text_members origin_with_path(const trace_source &source)
-{
-    text_members origin = origin_members(source);
-    origin.emplace_back("path", source.path); // "file" is what error records call the source that they are about
-    return origin;
-}
 
 std::string suffix_of(compression packed)
 {
@@ -70,20 +63,18 @@ private:
         file_.emplace(tree_.whole(path_), make_packer(packed_));
     }
 
-    // Bytes that are no UTF-8 are replaced: the records have the same texts with every byte kept.
     void describe(const trace_source &source, const losses &lost)
     {
-        using json = nlohmann::ordered_json;
-        json object;
-        for (const auto &[name, value] : origin_with_path(source)) object[name] = value;
-        object["output"] = file_ ? json(path_) : json(nullptr);
-        object["records"] = records_;
-        object["unfinished"] = lost.unfinished;
-        object["missing"] = lost.missing;
-        object["overwritten"] = lost.overwritten;
-        object["unspooled_pages"] = lost.unspooled;
-        object["last_reuse_time"] = lost.last_reuse_time;
-        about_sources_.write(object.dump(-1, ' ', true, json::error_handler_t::replace) + "\n");
+        line_.clear();
+        append_object(line_, [&](text_encoder &encode) {
+            nlohmann::ordered_json object;
+            for (const auto &[name, value] : origin_with_path(source)) object[name] = encode.text(value);
+            object["output"] = file_ ? encode.text(path_) : nlohmann::ordered_json(nullptr);
+            object["records"] = records_;
+            object.update(losses_json(lost));
+            return object;
+        });
+        about_sources_.write(line_);
     }
 
     const source_list &sources_;

@@ -175,7 +175,7 @@ void json_dump::header(std::string &out, std::string_view path, const reader::fi
         object["program"] = encode.text_or_null(header.program);
         object["base_program"] = encode.text_or_null(header.base_program);
         object["node_number"] = header.node_number;
-        object["node_id"] = header.node_id ? json(digits(*header.node_id)) : json(nullptr);
+        object["node_id"] = header.node_id ? json(fmt::format("{:016x}", *header.node_id)) : json(nullptr);
         object["file_size"] = header.file_size;
         object["time_base"] = time_base_object(header.time_info);
         object["tz_offset_minutes"] = number_or_null(header.tz_offset_minutes);

@@ -1,7 +1,8 @@
 // A trace as JSON lines for programs: one object for the file's header, then one for each record.
 //
-// Integers of 64 bits and times in nanoseconds are strings of decimal digits, so that no reader rounds them. The output
-// is pure ASCII: everything beyond it, and every control character, is written as \uXXXX.
+// Integers of 64 bits and times in nanoseconds are strings of decimal digits, so that no reader rounds them; the
+// identifier of a node is a string of 16 hexadecimal digits, as in the path of a copy. The output is pure ASCII:
+// everything beyond it, and every control character, is written as \uXXXX.
 //
 // JSON text is Unicode, the bytes in a trace need not be. An object in which some text is not well-formed UTF-8 has
 // "encoding": "latin-1", and then every character of its texts stands for the byte of that value: nothing is lost.

@@ -7,6 +7,7 @@
 #include <nlohmann/json.hpp>
 
 #include "tools/qntrace/format/escape.h"
+#include "tools/qntrace/format/json_text.h"
 #include "tools/qntrace/format/timestamps.h"
 
 namespace qn::dump
@@ -75,6 +76,25 @@ json_object time_json(const timespec &time, timestamps &times)
     return object;
 }
 
+void append_row(std::string &out, const folder_names &folders, const std::string &trace, const spool_row &row,
+                timestamps &times)
+{
+    append_object(out, [&](text_encoder &encode) {
+        json_object object = {{"type", "spool"}};
+        for (std::size_t i = 0; i < folders.size(); ++i)
+            object[level_names[level_names.size() - folders.size() + i]] = encode.text(folders[i]);
+        object["trace"] = encode.text(trace);
+        object["page_copies"] = row.page_copies;
+        object["file_copies"] = row.file_copies;
+        object["damaged"] = row.damaged;
+        object["unreadable"] = row.unreadable;
+        object["bytes"] = row.bytes;
+        if (row.first) object["first"] = time_json(*row.first, times);
+        if (row.last) object["last"] = time_json(*row.last, times);
+        return object;
+    });
+}
+
 } // namespace
 
 void spool_row::saw(const timespec &time)
@@ -115,26 +135,11 @@ std::string spool_table::text(bool utc) const
     return out;
 }
 
-// Bytes that are no UTF-8 are replaced: the names here are for people, `dump --json` keeps every byte.
 std::string spool_table::json(bool utc) const
 {
     timestamps times(utc);
     std::string out;
-    for (const auto &[key, row] : rows_) {
-        json_object object = {{"type", "spool"}};
-        const auto &[folders, trace] = key;
-        for (std::size_t i = 0; i < folders.size(); ++i)
-            object[level_names[level_names.size() - folders.size() + i]] = folders[i];
-        object["trace"] = trace;
-        object["page_copies"] = row.page_copies;
-        object["file_copies"] = row.file_copies;
-        object["damaged"] = row.damaged;
-        object["unreadable"] = row.unreadable;
-        object["bytes"] = row.bytes;
-        if (row.first) object["first"] = time_json(*row.first, times);
-        if (row.last) object["last"] = time_json(*row.last, times);
-        out += object.dump(-1, ' ', false, json_object::error_handler_t::replace) + "\n";
-    }
+    for (const auto &[key, row] : rows_) append_row(out, key.first, key.second, row, times);
     return out;
 }
 

@@ -8,6 +8,7 @@
 
 #include "tools/qntrace/format/durations.h"
 #include "tools/qntrace/format/escape.h"
+#include "tools/qntrace/format/json_text.h"
 #include "tools/qntrace/format/timestamps.h"
 #include "tools/qntrace/traces/losses_json.h"
 
@@ -146,22 +147,23 @@ json time_json(std::int64_t ns, timestamps &times)
     return object;
 }
 
-// Bytes that are no UTF-8 are replaced: `dump --json` keeps every byte.
+// An object that has no texts out of a trace.
 void append_line(std::string &out, const json &object)
 {
-    out += object.dump(-1, ' ', true, json::error_handler_t::replace);
-    out += '\n';
+    append_object(out, [&](text_encoder &) { return object; });
 }
 
 template <typename AddKey>
 void append_rows(std::string &out, const char *type, const amount_table &table, std::size_t most, AddKey add_key)
 {
-    for (const auto &[key, counted] : table.largest(most)) {
-        json object = {{"type", type}};
-        add_key(object, key);
-        object["records"] = counted.records;
-        object["bytes"] = counted.bytes;
-        append_line(out, object);
+    for (const auto &row : table.largest(most)) {
+        append_object(out, [&](text_encoder &encode) {
+            json object = {{"type", type}};
+            add_key(object, row.key, encode);
+            object["records"] = row.counted.records;
+            object["bytes"] = row.counted.bytes;
+            return object;
+        });
     }
 }
 
@@ -192,15 +194,17 @@ std::string stats_json(const stats_tally &tally, const stats_format &format)
     std::string out;
     append_line(out, totals(tally, times));
     append_rows(out, "component", tally.components, format.top,
-                [](json &object, std::uint64_t key) { object["comp"] = std::string(component_of_key(key)); });
+                [](json &object, std::uint64_t key, text_encoder &encode) {
+                    object["comp"] = encode.text(component_of_key(key));
+                });
     append_rows(out, "kind", tally.kinds, 0,
-                [](json &object, std::uint64_t key) { object["kind"] = kind_of_key(key); });
-    append_rows(out, "id", tally.ids, format.top, [](json &object, std::uint64_t key) {
-        object["comp"] = std::string(component_of_key(component_key_of_id_key(key)));
+                [](json &object, std::uint64_t key, text_encoder &) { object["kind"] = kind_of_key(key); });
+    append_rows(out, "id", tally.ids, format.top, [](json &object, std::uint64_t key, text_encoder &encode) {
+        object["comp"] = encode.text(component_of_key(component_key_of_id_key(key)));
         object["id"] = id_of_key(key);
     });
     append_rows(out, "thread", tally.threads, format.top,
-                [](json &object, std::uint64_t key) { object["thread"] = key; });
+                [](json &object, std::uint64_t key, text_encoder &) { object["thread"] = key; });
     const std::int64_t width = tally.buckets.width();
     for (const auto &[index, bucket] : tally.buckets.all()) {
         json object = {{"type", "bucket"}};

@@ -14,4 +14,11 @@ text_members origin_members(const trace_source &source)
     return origin;
 }
 
+text_members origin_with_path(const trace_source &source)
+{
+    text_members origin = origin_members(source);
+    origin.emplace_back("path", source.path);
+    return origin;
+}
+
 } // namespace qn::dump

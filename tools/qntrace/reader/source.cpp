@@ -78,7 +78,7 @@ std::span<const std::byte> window::fetch(std::uint64_t offset, std::size_t count
 void window::make_room(std::size_t bytes)
 {
     if (bytes <= buffer_.size()) return;
-    buffer_ = {};
+    std::vector<std::byte>().swap(buffer_);
     try {
         buffer_.resize(bytes);
     } catch (const std::bad_alloc &) {

@@ -1,4 +1,6 @@
 // Bodies whose counts, lengths and offsets do not fit: the sound part is kept, the rest told.
+#include <algorithm>
+
 #include <gtest/gtest.h>
 
 #include "reader/reading.h"
@@ -76,7 +78,9 @@ TEST(Decode, AnnouncedDataBlocksMustFit)
     EXPECT_EQ(read.problem, "3 data blocks are announced, 2 fit");
     EXPECT_EQ(read.line.substr(0, read.line.find('\n')), "id=1 2 blocks");
     read = decode_alone(3, body().u32(1).u32(0x7FFFFFFF).u32(4).chars("abcd"));
-    EXPECT_EQ(read.problem, "2147483647 data blocks are announced, 1 fit");
+    EXPECT_EQ(read.problem, "2147483647 data blocks are announced, no writer gives more than 128");
+    read = decode_alone(3, body().u32(1).u32(128).u32(4).chars("abcd"));
+    EXPECT_EQ(read.problem, "128 data blocks are announced, 1 fit");
     read = decode_alone(3, body().u32(1).u32(1).u32(9).chars("abcdefgh"));
     EXPECT_EQ(read.problem, "the length 9 of data block 0 does not fit into the record");
     read = decode_alone(3, body().u32(1).u32(1).u32(0x7FFFFFFF).zeros(8));
@@ -106,13 +110,31 @@ TEST(Decode, AnnouncedStringsMustBeThere)
     EXPECT_EQ(read.problem, "4294967295 bytes of strings are announced, 4 fit");
     read = decode_alone(15, body().u32(1).u32(0xFFFFFFFF).u32(4).text("abc"));
     EXPECT_EQ(read.line, "id=1 \"abc\"\n");
-    EXPECT_EQ(read.problem, "4294967295 strings are announced, 1 are complete");
+    EXPECT_EQ(read.problem, "4294967295 strings are announced, no writer gives more than 32");
+    read = decode_alone(15, body().u32(1).u32(32).u32(4).text("abc"));
+    EXPECT_EQ(read.problem, "32 strings are announced, 1 are complete");
     read = decode_alone(15, body().u32(1).u32(1).u32(6).text("abc").text("d"));
     EXPECT_EQ(read.line, "id=1 \"abc\"\n");
     EXPECT_EQ(read.problem, "2 bytes behind the last string belong to none");
     read = decode_alone(15, body().u32(1).u32(0).u32(0));
     EXPECT_EQ(read.line, "id=1\n");
     EXPECT_EQ(read.problem, "");
+}
+
+TEST(Decode, NoMoreStringsThanAWriterGivesAreDecoded)
+{
+    EXPECT_EQ(decode_alone(15, body().u32(1).u32(32).u32(32).zeros(32)).problem, "");
+    const auto read = decode_alone(15, body().u32(1).u32(33).u32(33).zeros(33));
+    EXPECT_EQ(read.problem, "33 strings are announced, no writer gives more than 32");
+    EXPECT_EQ(std::count(read.line.begin(), read.line.end(), '"'), 2 * 32);
+}
+
+TEST(Decode, NoMoreDataBlocksThanAWriterGivesAreDecoded)
+{
+    EXPECT_EQ(decode_alone(3, body().u32(1).u32(128).zeros(128 * 4)).problem, "");
+    const auto read = decode_alone(3, body().u32(1).u32(129).zeros(129 * 4));
+    EXPECT_EQ(read.problem, "129 data blocks are announced, no writer gives more than 128");
+    EXPECT_EQ(read.line.substr(0, read.line.find('\n')), "id=1 128 blocks");
 }
 
 TEST(Decode, TextsMustEndInsideTheirRecord)
@@ -167,6 +189,38 @@ TEST(Decode, AnErrorsAnnouncedArgumentsMustFit)
         EXPECT_EQ(read.problem, std::to_string(count) + " arguments are announced, 1 fit");
         EXPECT_EQ(read.line, "id=31 error=18\n    catalogue set 2 message 3\n");
     }
+}
+
+// An error of a file of its own, with that many integer arguments.
+reader::decoded_record error_with_integers(std::uint32_t count)
+{
+    const std::uint32_t length = 72 + 16 * count;
+    trace_builder file(200 + 3 * std::size_t{length});
+    file.add(14, error_with(0, count, body().zeros(16 * std::size_t{count})));
+    file.close();
+    file.set_oldest(200);
+    reader::memory_source source(file.bytes());
+    reader::trace_reader trace(source, [](const reader::finding &) {});
+    auto record = trace.next();
+    return {std::move(record->body), std::move(record->problem)};
+}
+
+TEST(Decode, AnErrorsArgumentsAreBounded)
+{
+    EXPECT_EQ(error_with_integers(4096).problem, "");
+    const auto read = error_with_integers(4097);
+    EXPECT_EQ(read.problem, "4097 arguments are announced, no writer gives more than 4096");
+    EXPECT_EQ(std::get<reader::error_body>(read.body).arguments.size(), 4096U);
+}
+
+TEST(Decode, AnErrorsStringsTakeNoMoreRoomThanTheRecordHas)
+{
+    byte_string rest = body();
+    for (int i = 0; i < 3; ++i) rest.u32(5).u32(0).u64(72 + 3 * 16);
+    const auto read = decode_alone(14, error_with(0, 3, rest.text("open_it")));
+    EXPECT_EQ(read.problem, "the string at 120 of the record runs into another one");
+    EXPECT_NE(read.line.find("    argument 1 string \"open_it\"\n    argument 2 string none\n"), std::string::npos)
+        << read.line;
 }
 
 TEST(Decode, AnErrorsStringArgumentsAreChecked)

@@ -67,6 +67,31 @@ TEST(SpoolCommand, OnANodeOfNoClusterNamesHostNodeAndProgram)
     EXPECT_EQ(found[0]["program"], "mydaemon");
 }
 
+TEST(SpoolCommand, OfAFolderThatHoldsSpoolDirectoriesNamesNoCluster)
+{
+    const spool_directory spool;
+    spool.put("var/spool/trace/h1/000000000000002a/a", "app.trc.1.sp.2026_11_21_05_13_00.123456", two_records());
+    spool.put("var/spool/trace/c1/id1/h1/000000000000002a/b", "app.trc.1.sp.2026_11_21_05_13_00.123456", two_records());
+    const auto found = sound_rows({spool.root});
+    ASSERT_EQ(found.size(), 2U);
+    for (const auto &row : found) {
+        EXPECT_FALSE(row.contains("cluster")) << row;
+        EXPECT_FALSE(row.contains("cluster_id")) << row;
+        EXPECT_EQ(row["host"], "h1");
+        EXPECT_EQ(row["node_id"], "000000000000002a");
+    }
+}
+
+TEST(SpoolCommand, OfAFolderInsideAClustersNamesNoCluster)
+{
+    const spool_directory spool;
+    spool.put("app.trc.1.sp.2026_11_21_05_13_00.123456");
+    const auto found = sound_rows({spool.root + "/c1"});
+    ASSERT_EQ(found.size(), 1U);
+    EXPECT_FALSE(found[0].contains("cluster_id"));
+    EXPECT_EQ(found[0]["host"], "h1");
+}
+
 TEST(SpoolCommand, CountsCopiesOfWholeFilesByThemselves)
 {
     const spool_directory spool;

@@ -110,6 +110,42 @@ TEST(TraceSet, ANodeOfNoClusterHasNone)
     EXPECT_FALSE(found[0].contains("cluster"));
 }
 
+TEST(TraceSet, AFolderThatHoldsSpoolDirectoriesTellsNoCluster)
+{
+    const spool_directory spool;
+    spool.put("var/spool/trace/h1/000000000000002a/app", copy_of("app.trc.1.sp"), ids_from(10, {1}, 0x2a));
+    const auto found = sound_objects("merge", {spool.root});
+    ASSERT_EQ(found.size(), 1U);
+    EXPECT_EQ(found[0]["node"], "h1");
+    EXPECT_FALSE(found[0].contains("cluster"));
+}
+
+TEST(TraceSet, AFileOfANewerFormatInAFolderIsToldWithStatus1AndTheRestIsRead)
+{
+    const scratch_folder folder;
+    fs::create_directory(folder.path("in"));
+    folder.file("in/a.trc", ids_from(10, {1}).bytes());
+    auto newer = ids_from(20, {2});
+    newer.put_u16(2, 7);
+    folder.file("in/b.trc", newer.bytes());
+    const auto shown = run_qntrace({"merge", "--json", folder.path("in")});
+    EXPECT_EQ(shown.status, 1);
+    EXPECT_EQ(ids_in(shown), ids{1});
+    EXPECT_NE(shown.err.find("b.trc: offset 2: format version 7 is newer"), std::string::npos) << shown.err;
+}
+
+TEST(TraceSet, TheOtherFilesOfAFolderAreCounted)
+{
+    const scratch_folder folder;
+    fs::create_directory(folder.path("in"));
+    folder.file("in/a.trc", ids_from(10, {1}).bytes());
+    folder.file("in/empty", {});
+    folder.file("in/notes.txt", byte_string().text("not a trace").bytes());
+    const auto shown = run_qntrace({"merge", "--json", folder.path("in")});
+    EXPECT_EQ(shown.status, 0);
+    EXPECT_EQ(shown.err, "qntrace: " + folder.path("in") + ": 2 other files were passed over\n");
+}
+
 TEST(TraceSet, APageAndItsCopyOfANodeWithoutIdAreReadOnce)
 {
     const spool_directory spool;

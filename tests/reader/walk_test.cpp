@@ -1,6 +1,7 @@
 // The way round the ring: sound ones, torn ones, and ones that move while they are read.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstring>
 #include <functional>
 
@@ -370,6 +371,44 @@ TEST(Walk, ARecordCompletedMeanwhileIsShown)
     const auto read = read_all(source);
     EXPECT_TRUE(read.findings.empty());
     EXPECT_EQ(read.data_seqs(), (seqs{2, 4}));
+}
+
+// Tells the longest stretch that was read at a time.
+class measured_source final : public reader::byte_source
+{
+public:
+    explicit measured_source(std::span<const std::byte> bytes) : source_(bytes) {}
+    std::uint64_t size() const override { return source_.size(); }
+    std::size_t read_at(std::uint64_t offset, std::span<std::byte> into) override
+    {
+        longest = std::max(longest, into.size());
+        return source_.read_at(offset, into);
+    }
+    std::size_t longest = 0;
+
+private:
+    reader::memory_source source_;
+};
+
+TEST(Walk, WhoOnlyCountsDoesNotReadALongRecord)
+{
+    constexpr std::size_t window_bytes = 4096;
+    trace_builder file(100'000);
+    file.add(12, file.body().u32(17).u32(10'000).zeros(40'000));
+    file.add_id(18);
+    file.close();
+    file.set_oldest(200);
+    measured_source source(file.bytes());
+    reader::trace_reader trace(
+        source, [](const reader::finding &) {}, window_bytes);
+    const auto first = trace.next_undecoded();
+    ASSERT_TRUE(first);
+    EXPECT_EQ(first->raw.header.length, 28U + 8 + 40'000);
+    EXPECT_EQ(first->raw.bytes.u32(28), 17U);
+    const auto second = trace.next_undecoded();
+    ASSERT_TRUE(second);
+    EXPECT_EQ(second->raw.bytes.u32(28), 18U);
+    EXPECT_EQ(source.longest, window_bytes);
 }
 
 } // namespace

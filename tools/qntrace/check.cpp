@@ -41,7 +41,8 @@ int check_one(const std::string &path, const check_options &options)
 
 int check_all(const check_options &options)
 {
-    const trace_set set = find_traces(options.files, duplicates::kept);
+    const trace_set set =
+        find_traces(options.files, duplicates::kept, options.quiet ? passed_over::untold : passed_over::told);
     if (set.sources.empty() && set.status == status_sound) write_message("there are no trace files");
     int worst = set.status;
     for (const trace_source &source : set.sources) worst = std::max(worst, check_one(source.path, options));

@@ -34,19 +34,12 @@ struct stats_options {
     std::shared_ptr<const selection> selected;
 };
 
-bool carries_data(const reader::raw_record &record)
-{
-    using qn::tr::format::kind;
-    const auto what = static_cast<kind>(record.header.function);
-    return what != kind::free_space && what != kind::being_written;
-}
-
 // Counts the whole file without decoding its records.
 void count_all(reader::trace_reader &trace, stats_tally &tally, loss_counter &lost)
 {
     while (const auto record = trace.next_undecoded()) {
         const std::uint64_t missing = lost.pass(record->raw);
-        if (carries_data(record->raw)) tally.add(record->raw, record->time, missing);
+        if (reader::carries_data(record->raw)) tally.add(record->raw, record->time, missing);
     }
 }
 
@@ -56,7 +49,7 @@ void count_selected(const trace_origin &origin, reader::trace_reader &trace, con
 {
     while (const auto record = trace.next()) {
         const std::uint64_t missing = lost.pass(record->raw);
-        if (carries_data(record->raw) && selected.admits(origin, *record))
+        if (reader::carries_data(record->raw) && selected.admits(origin, *record))
             tally.add(record->raw, record->time, missing);
     }
 }

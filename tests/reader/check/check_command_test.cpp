@@ -135,6 +135,27 @@ TEST(Check, AFoldersFilesThatAreNoTraceFilesArePassedOver)
     const auto shown = check({folder.path(".")});
     EXPECT_EQ(shown.status, 0);
     EXPECT_EQ(shown.out, folder.path("./app.trc") + ": sound, 2 records\n");
+    EXPECT_EQ(shown.err, "qntrace: " + folder.path(".") + ": 1 other file was passed over\n");
+    EXPECT_EQ(check({"--quiet", folder.path(".")}).err, "");
+}
+
+TEST(Check, AFoldersTraceFilesAreCheckedAlsoWhenTheirHeaderIsCutOrTorn)
+{
+    const scratch_folder folder;
+    const auto bytes = sound().copy();
+    folder.file("cut.trc", std::span(bytes).first(100));
+    trace_builder bounds = sound();
+    bounds.put_u32(8, 0xFFFFFFFF);
+    bounds.put_u32(20, 0);
+    folder.file("bounds.trc", bounds.bytes());
+    trace_builder mark = sound();
+    for (std::size_t i = 0; i < 12; ++i) mark.put_u8(i, 0xFF);
+    folder.file("mark.trc", mark.bytes());
+    const auto shown = check({folder.path(".")});
+    EXPECT_EQ(shown.status, 1);
+    for (const auto *name : {"cut.trc", "bounds.trc", "mark.trc"})
+        EXPECT_NE(shown.out.find(std::string(name) + ": damaged"), std::string::npos) << name << shown.out;
+    EXPECT_EQ(shown.err, "");
 }
 
 TEST(Check, APageInAFolderIsAPageAlsoWhenItsHeaderIsGone)

@@ -162,6 +162,21 @@ TEST_F(Follow, ShowsTheRecordsBehindADamagedNumber)
     EXPECT_NE(shown.out.find("\"id\":3"), std::string::npos) << shown.out;
 }
 
+TEST_F(Follow, ShowsAllPagesOfATraceThatNobodyWrites)
+{
+    trace_builder page(4096);
+    page.component = "WRIT";
+    page.add(13, page.body().u32(1).u32(1).u64(5));
+    page.close();
+    trace_builder empty = page;
+    empty.put_u16(200 + 4, 65535); // its only record was not completed
+    for (const auto *name : {"pages.trc.1.sp", "pages.trc.3.sp", "pages.trc.4.sp"}) folder.file(name, page.bytes());
+    folder.file("pages.trc.2.sp", empty.bytes());
+    follower running({"follow", "--json", "--from-start", "--until-exit", folder.path("pages.trc")});
+    running.ended();
+    EXPECT_EQ(running.values(), (std::vector<std::uint64_t>{5, 5, 5}));
+}
+
 TEST_F(Follow, EndsBySignalsWithAllThatWasWrittenShown)
 {
     live_writer writer(file);

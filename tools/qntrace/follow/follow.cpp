@@ -18,7 +18,7 @@ void follow_until_told_to_end(trace_follower &trace, follow_output &output, cons
     bool caught_up = false;
     bool writer_has_ended = false;
     for (;;) {
-        const bool some = trace.advance();
+        const bool some = writer_has_ended ? trace.advance_to_the_end() : trace.advance();
         if (!caught_up && trace.caught_up()) {
             caught_up = true;
             output.caught_up();
@@ -30,12 +30,9 @@ void follow_until_told_to_end(trace_follower &trace, follow_output &output, cons
         }
         flush_data();
         if (writer_has_ended) return;
-        writer_has_ended = options.until_exit && !trace.is_being_written();
         // What it has written up to its end is read before the following ends.
-        if (writer_has_ended)
-            trace.look_at_all();
-        else if (!wait.wait())
-            return;
+        writer_has_ended = options.until_exit && !trace.is_being_written();
+        if (!writer_has_ended && !wait.wait()) return;
     }
 }
 

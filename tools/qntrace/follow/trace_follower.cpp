@@ -81,6 +81,7 @@ bool trace_follower::is_being_written() const
 
 bool trace_follower::advance()
 {
+    entered_ = false;
     if (current_ != nullptr && step()) return true;
     const auto now = std::chrono::steady_clock::now();
     const bool due = current_ == nullptr || current_->new_life || current_->ring->finished() || now >= next_scan_;
@@ -94,6 +95,16 @@ bool trace_follower::advance()
     }
     if (next.file != current_ || next.unread) enter(next);
     return step();
+}
+
+// There may be no record to hand out in a file, and some in the next one. Each is entered once, or once more.
+bool trace_follower::advance_to_the_end()
+{
+    for (std::size_t tries = 0;; ++tries) {
+        next_scan_ = {};
+        if (advance()) return true;
+        if (!entered_ || tries > 2 * members_.size()) return false;
+    }
 }
 
 bool trace_follower::step()
@@ -210,6 +221,7 @@ void trace_follower::enter(const life &next)
     member &file = *next.file;
     member *before = current_;
     if (before != nullptr) leave();
+    entered_ = true;
     if (next.unread) {
         if (before != nullptr) tell_pages_lost(*before, file);
         if (file.page == 0 && file.new_life) to_.tell(file.path, "was started anew");

@@ -47,12 +47,12 @@ public:
     // Hands out what there is, as much as lies together; false when there is nothing at the moment. Throws io_error for
     // a file that cannot be read, or when there is none at first; not_a_trace when it is none at first.
     bool advance();
+    // The same when nothing is written any more: false when nothing is left in any of the files.
+    bool advance_to_the_end();
     // What there was at the beginning has been handed out.
     bool caught_up() const;
     // Whether the process that writes the trace has it mapped.
     bool is_being_written() const;
-    // Looks at all files at the next advance(), also when that would not be due.
-    void look_at_all() { next_scan_ = {}; }
     // Tells what is not complete.
     void finish();
 
@@ -83,6 +83,7 @@ private:
     std::map<std::string, std::unique_ptr<member>> members_;
     member *current_ = nullptr;
     bool started_ = false; // the first scan is done
+    bool entered_ = false; // by the last advance()
     std::chrono::steady_clock::time_point next_scan_;
 };
 

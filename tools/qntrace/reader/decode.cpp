@@ -12,6 +12,12 @@ namespace
 namespace format = qn::tr::format;
 using format::kind;
 
+// What the writers' arguments are checked against.
+constexpr std::uint32_t most_strings = 32;
+constexpr std::uint32_t most_blocks = 128;
+// An error has as many inserts as its message has conversions, for which there is no limit; a call with more is none.
+constexpr std::uint32_t most_arguments = 4096;
+
 // Decodes one record; the first thing that does not fit is the one that is told.
 class decoder
 {
@@ -43,8 +49,9 @@ public:
         body.count = bytes_.u32(offsetof(trace_record_data_t, n_blocks));
         // The writer takes a count that is negative as a signed number and stores it with no blocks.
         if (static_cast<std::int32_t>(body.count) < 0) return body;
+        const std::uint32_t count = bounded(body.count, most_blocks, "data blocks");
         std::uint64_t at = sizeof(trace_record_data_t);
-        for (std::uint32_t i = 0; i < body.count; ++i) {
+        for (std::uint32_t i = 0; i < count; ++i) {
             constexpr std::size_t length_bytes = sizeof(trace_data_block_t);
             if (!bytes_.holds(at, length_bytes)) {
                 complain("{} data blocks are announced, {} fit", body.count, i);
@@ -83,10 +90,11 @@ public:
         body.id = bytes_.u32(offsetof(trace_record_strings_t, id));
         const std::uint32_t number = bytes_.u32(offsetof(trace_record_strings_t, number));
         const std::uint32_t announced = bytes_.u32(offsetof(trace_record_strings_t, len_strings));
+        const std::uint32_t count = bounded(number, most_strings, "strings");
         const std::uint64_t room = bytes_.size() - fixed_bytes;
         if (announced > room) complain("{} bytes of strings are announced, {} fit", announced, room);
         auto rest = bytes_.chars(fixed_bytes, std::min<std::uint64_t>(announced, room));
-        while (body.strings.size() < number) {
+        while (body.strings.size() < count) {
             const auto [text, terminated] = cut_at_nul(rest);
             if (!terminated) {
                 complain("{} strings are announced, {} are complete", number, body.strings.size());
@@ -119,6 +127,8 @@ public:
             count = 0; // what stands there is as likely the strings
         }
         const std::uint64_t strings_at = fixed_bytes + count * sizeof(trace_error_arg_t);
+        count = bounded(count, most_arguments, "arguments");
+        text_room_ = bytes_.size() - strings_at;
         const auto string_of = [&](std::size_t field) { return string_at(bytes_.u32(field), strings_at); };
         body.function = string_of(offsetof(trace_record_error_t, funcNameOffset));
         body.file = string_of(offsetof(trace_record_error_t, fileNameOffset));
@@ -168,6 +178,13 @@ private:
         if (problem_.empty()) problem_ = fmt::format(text, values...);
     }
 
+    // How many of what is announced are decoded, so that what is damaged takes no more memory than what is sound.
+    std::uint32_t bounded(std::uint32_t announced, std::uint32_t most, std::string_view what)
+    {
+        if (announced > most) complain("{} {} are announced, no writer gives more than {}", announced, what, most);
+        return std::min(announced, most);
+    }
+
     cu_timeinfo_t time_info(std::size_t at)
     {
         cu_timeinfo_t info = {};
@@ -185,7 +202,8 @@ private:
         return text;
     }
 
-    // A string of an error record; none at offset 0. The strings stand behind the arguments.
+    // A string of an error record; none at offset 0. The strings stand behind the arguments, and each has its own bytes:
+    // together they are no longer than what there is.
     std::optional<std::string_view> string_at(std::uint64_t offset, std::uint64_t strings_at)
     {
         if (offset == 0) return std::nullopt;
@@ -193,15 +211,23 @@ private:
             complain("the string offset {} lies outside {} to {}", offset, strings_at, bytes_.size());
             return std::nullopt;
         }
-        const auto [text, terminated] = cut_at_nul(bytes_.chars(offset, bytes_.size() - offset));
+        const std::uint64_t rest = bytes_.size() - offset;
+        const auto [text, terminated] = cut_at_nul(bytes_.chars(offset, std::min(rest, text_room_)));
+        if (!terminated && rest > text_room_) {
+            complain("the string at {} of the record runs into another one", offset);
+            text_room_ = 0;
+            return std::nullopt;
+        }
         if (!terminated) {
             complain("the string at {} of the record has no end", offset);
             return std::nullopt;
         }
+        text_room_ -= text.size() + 1;
         return text;
     }
 
     const byte_view &bytes_;
+    std::uint64_t text_room_ = 0; // for the strings of an error that were not decoded yet
     std::string problem_;
 };
 

@@ -2,7 +2,8 @@
 //
 // Text and bytes are views into the record's own bytes and live as long as they do. Every count, length and offset of
 // a body is checked against the record before it is followed; what does not fit is left out and `problem` says so, so
-// that the sound part of a damaged record can still be shown.
+// that the sound part of a damaged record can still be shown. Counts that no writer gives are not followed either: a body
+// takes little memory, whatever stands in the record.
 #pragma once
 
 #include <cstdint>

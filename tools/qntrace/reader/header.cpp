@@ -181,6 +181,29 @@ std::optional<file_header> read_header(window &file, const finding_sink &report)
     return header;
 }
 
+bool is_meant_as_header(window &file)
+{
+    const auto bytes = file.fetch(0, format::header_bytes);
+    constexpr std::size_t mark_bytes = offsetof(trace_file_header_t, uFlags);
+    constexpr std::uint16_t newest_thinkable_version = 255;
+    if (bytes.size() < mark_bytes) return false;
+    const auto properties = std::to_integer<std::uint8_t>(bytes[0]);
+    const bool little = (properties & format::properties::little_endian) != 0;
+    const byte_view start(bytes, little ? byte_order::little : byte_order::big);
+    const auto version = start.u16(offsetof(trace_file_header_t, uVersion));
+    const bool marked = (properties & ~format::properties::little_endian) == format::properties::always &&
+                        start.u8(offsetof(trace_file_header_t, uPlatform)) == format::platform_linux;
+    if (marked && version != 0 && version <= newest_thinkable_version) return true;
+    if (bytes.size() < format::header_bytes) return false;
+    const auto half_right = [&](byte_order order) {
+        const file_header header = parse(bytes, order);
+        const ring_bounds ring{format::header_bytes, file.source_size(), {}};
+        return (header.ring_offset == ring.begin || header.file_size == ring.end) &&
+               oldest_plausible(header.oldest_record_offset, ring);
+    };
+    return half_right(byte_order::little) || half_right(byte_order::big);
+}
+
 std::optional<std::uint64_t> reread_oldest(byte_source &source, const file_header &header)
 {
     std::array<std::byte, 4> word = {};

@@ -54,6 +54,10 @@ struct file_header {
 // Nothing when the file cannot be read as a trace file; the sink has then been told why.
 std::optional<file_header> read_header(window &file, const finding_sink &report);
 
+// Of a file that read_header() refuses: whether its first bytes tell that it was to be a trace file all the same, of a
+// newer version, or cut, or with a torn header.
+bool is_meant_as_header(window &file);
+
 // The offset of the oldest record as the header of a live file has it now, when it is a possible one.
 std::optional<std::uint64_t> reread_oldest(byte_source &source, const file_header &header);
 

@@ -58,7 +58,7 @@ std::optional<trace_record> trace_reader::next()
 std::optional<undecoded_record> trace_reader::next_undecoded()
 {
     if (!walk_) return std::nullopt;
-    const auto raw = walk_->next();
+    const auto raw = walk_->next(extent::id);
     if (!raw) return std::nullopt;
     if (raw->oversized || !is_ordinary(raw->header)) decode_and_report(*raw);
     return undecoded_record{*raw, time_of(raw->header)};

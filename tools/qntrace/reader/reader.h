@@ -45,7 +45,7 @@ public:
     // Fillers and unfinished records included. What the record refers to is valid until the next call.
     std::optional<trace_record> next();
     // The same without the body, for who only counts: bodies are looked at where they tell the time, or that something
-    // is wrong with the record as a whole.
+    // is wrong with the record as a whole. Of the bodies that begin with an id, no more than that is read.
     std::optional<undecoded_record> next_undecoded();
 
     // Bytes of the ring, as far as the header tells its size, that the records so far do not cover because of damage.

@@ -3,7 +3,9 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <new>
 
+#include <fmt/format.h>
 #include <unistd.h>
 
 namespace qn::reader
@@ -64,12 +66,24 @@ std::span<const std::byte> window::fetch(std::uint64_t offset, std::size_t count
     if (!inside) {
         filled_ = 0; // read_at() may throw and leave the buffer half written
         const std::size_t usual = std::min<std::uint64_t>(usual_bytes_, source_.size());
-        buffer_.resize(std::max({buffer_.size(), usual, count}));
+        make_room(std::max(usual, count));
         filled_ = source_.read_at(offset, buffer_);
         start_ = offset;
     }
     const std::size_t skipped = static_cast<std::size_t>(offset - start_);
     return std::span<const std::byte>(buffer_).subspan(skipped, std::min(count, filled_ - skipped));
+}
+
+// What was in the buffer is not kept, so that there are not two of them at a time.
+void window::make_room(std::size_t bytes)
+{
+    if (bytes <= buffer_.size()) return;
+    std::vector<std::byte>().swap(buffer_);
+    try {
+        buffer_.resize(bytes);
+    } catch (const std::bad_alloc &) {
+        throw io_error(ENOMEM, fmt::format("{} bytes cannot be read at once", bytes));
+    }
 }
 
 } // namespace qn::reader

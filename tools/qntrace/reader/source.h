@@ -78,12 +78,15 @@ public:
     }
 
     std::uint64_t source_size() const { return source_.size(); }
-    // `count` bytes from `offset` on, fewer only where the source ends. Valid until the next call.
+    // `count` bytes from `offset` on, fewer only where the source ends. Valid until the next call. Throws io_error, also
+    // when there is no memory for that many.
     std::span<const std::byte> fetch(std::uint64_t offset, std::size_t count);
     // Forgets the copy, so that the next fetch() sees the source as it is then.
     void drop() { filled_ = 0; }
 
 private:
+    void make_room(std::size_t bytes);
+
     byte_source &source_;
     std::size_t usual_bytes_;
     std::vector<std::byte> buffer_;

@@ -20,6 +20,19 @@ bool has_body(const record_header &header)
     return header.function != free_function && header.function != unfinished_function;
 }
 
+bool begins_with_id(const record_header &header)
+{
+    switch (static_cast<format::kind>(header.function)) {
+    case format::kind::identifier:
+    case format::kind::data_blocks:
+    case format::kind::values_32:
+    case format::kind::values_64:
+    case format::kind::error:
+    case format::kind::strings: return true;
+    default: return false;
+    }
+}
+
 } // namespace
 
 record_header parse_record_header(const byte_view &view)
@@ -41,6 +54,8 @@ bool is_numbered(const record_header &header)
     return header.function != free_function || (header.seq != format::seq_filler && header.seq != 0);
 }
 
+bool carries_data(const raw_record &record) { return has_body(record.header); }
+
 bool later(std::uint32_t seq, std::uint32_t than) { return static_cast<std::int32_t>(seq - than) > 0; }
 
 ring_walk::ring_walk(byte_source &source, window &file, const file_header &header, finding_sink report)
@@ -53,7 +68,7 @@ ring_walk::ring_walk(byte_source &source, window &file, const file_header &heade
     }
 }
 
-std::optional<raw_record> ring_walk::next()
+std::optional<raw_record> ring_walk::next(extent wanted)
 {
     while (leg_ != leg::done) {
         const std::uint64_t offset = at_;
@@ -63,7 +78,7 @@ std::optional<raw_record> ring_walk::next()
         }
         std::optional<raw_record> record;
         if (problem.empty()) {
-            record = take(offset, header);
+            record = take(offset, header, wanted);
             if (!record) problem = "this record changed while it was read";
         }
         if (!problem.empty()) {
@@ -115,7 +130,7 @@ ring_walk::tile ring_walk::look_at(std::uint64_t offset)
 }
 
 // The record's bytes, copied at one moment; nothing when they are no longer those of `header`.
-std::optional<raw_record> ring_walk::take(std::uint64_t offset, const record_header &header)
+std::optional<raw_record> ring_walk::take(std::uint64_t offset, const record_header &header, extent wanted)
 {
     // A writer gives no record more than half the ring, and up to 28 bytes that it would not use otherwise.
     const std::uint64_t longest = (header_.ring.end - header_.ring.begin) / 2 + format::record_header_bytes;
@@ -123,9 +138,11 @@ std::optional<raw_record> ring_walk::take(std::uint64_t offset, const record_hea
     record.offset = offset;
     record.oversized = has_body(header) && header.length > longest;
     const bool whole = has_body(header) && !record.oversized;
-    const std::size_t wanted = whole ? header.length : format::record_header_bytes;
-    const auto bytes = file_.fetch(offset, wanted);
-    if (bytes.size() < wanted) return std::nullopt;
+    std::size_t needed = whole ? header.length : format::record_header_bytes;
+    if (wanted == extent::id && begins_with_id(header))
+        needed = std::min(needed, format::record_header_bytes + sizeof(std::uint32_t));
+    const auto bytes = file_.fetch(offset, needed);
+    if (bytes.size() < needed) return std::nullopt;
     record.bytes = byte_view(bytes, header_.order);
     record.header = parse_record_header(record.bytes);
     if (record.header.length != header.length || record.header.function != header.function) return std::nullopt;

@@ -52,13 +52,19 @@ struct raw_record {
     bool oversized = false;
 };
 
+// False for what holds no record: free space, and a record that was not completed.
+bool carries_data(const raw_record &record);
+
+// How much of a record is fetched: all of it, or of the kinds that begin with an id no more than that.
+enum class extent { whole, id };
+
 class ring_walk
 {
 public:
     ring_walk(byte_source &source, window &file, const file_header &header, finding_sink report);
 
     // The next record, fillers and unfinished ones included; its bytes are valid until the next call.
-    std::optional<raw_record> next();
+    std::optional<raw_record> next(extent wanted = extent::whole);
     // Bytes that the walk has passed over because of damage.
     std::uint64_t unreadable_bytes() const { return unreadable_bytes_; }
 
@@ -71,7 +77,7 @@ private:
     };
 
     tile look_at(std::uint64_t offset);
-    std::optional<raw_record> take(std::uint64_t offset, const record_header &header);
+    std::optional<raw_record> take(std::uint64_t offset, const record_header &header, extent wanted);
     void advance(std::uint64_t offset, std::uint32_t length);
     void derail(std::uint64_t offset, const std::string &problem);
     bool catch_up();

@@ -105,9 +105,10 @@ void spool_row::saw(const timespec &time)
 
 spool_row &spool_table::row_of(const spooled_copy &copy)
 {
-    // Counted from the copy: there are fewer folders on a node of no cluster, and more below a folder that holds
-    // several spool directories.
-    const std::size_t levels = std::min(copy.folders.size(), level_names.size());
+    // Counted from the copy: there are more folders below one that holds several spool directories, and those above the
+    // host are then not known to be a cluster's.
+    const std::size_t known = begin_with_cluster(copy.folders) ? level_names.size() : level_names.size() - 2;
+    const std::size_t levels = std::min(copy.folders.size(), known);
     return rows_[{folder_names(copy.folders.end() - static_cast<std::ptrdiff_t>(levels), copy.folders.end()),
                   copy.name.trace}];
 }

@@ -77,6 +77,16 @@ std::optional<copy_name> parse_copy_name(std::string_view name)
     return copy_name{source, false};
 }
 
+bool is_node_folder(std::string_view name)
+{
+    return name.size() == 16 && name.find_first_not_of("0123456789abcdef") == std::string_view::npos;
+}
+
+bool begin_with_cluster(const std::vector<std::string> &folders)
+{
+    return folders.size() == 5 && is_node_folder(folders[3]); // cluster, cluster id, host, node id, program
+}
+
 void spool_tree::walk(const std::string &directory)
 {
     pending_.push_back(directory);

@@ -31,6 +31,13 @@ struct copy_name {
 // Nothing for a name that the library gives no copy.
 std::optional<copy_name> parse_copy_name(std::string_view name);
 
+// Whether that is the name of a node's folder: 16 hexadecimal digits.
+bool is_node_folder(std::string_view name);
+
+// Whether the folders on the way to a copy begin with a cluster and its identifier: when these two, and no others, stand
+// between the folder that was named and the host.
+bool begin_with_cluster(const std::vector<std::string> &folders);
+
 struct spooled_copy {
     copy_name name;
     std::vector<std::string> folders; // on the way from the spool directory to the copy

@@ -27,8 +27,8 @@ life_end end_of(const trace_source &source)
     try {
         reader::file_source file(source.path);
         reader::trace_reader trace(file, ignore);
-        while (const auto record = trace.next()) {
-            if (!reader::carries_data(record->body)) continue;
+        while (const auto record = trace.next_undecoded()) {
+            if (!reader::carries_data(record->raw)) continue;
             end.newest = record->raw.header.seq;
             ++end.finished;
         }
@@ -58,11 +58,11 @@ auto life_of(const trace_source &source)
 
 } // namespace
 
-bool is_trace_file(const std::string &path)
+bool is_meant_as_trace_file(const std::string &path)
 {
     reader::file_source file(path);
     reader::window window(file, first_look_bytes);
-    return reader::read_header(window, ignore).has_value();
+    return reader::read_header(window, ignore).has_value() || reader::is_meant_as_header(window);
 }
 
 void look_at(trace_source &source)
@@ -75,8 +75,8 @@ void look_at(trace_source &source)
     if (header->node_id.value_or(0) != 0) source.node_id = fmt::format("{:016x}", *header->node_id);
     source.node_number = header->node_number;
     if (!header->base_program.value_or("").empty()) source.program = *header->base_program;
-    while (const auto record = trace.next()) {
-        if (!reader::carries_data(record->body)) continue;
+    while (const auto record = trace.next_undecoded()) {
+        if (!reader::carries_data(record->raw)) continue;
         const reader::record_header &raw = record->raw.header;
         source.first = first_record{raw.counter, raw.seq, raw.thread, raw.component, record->time};
         return;

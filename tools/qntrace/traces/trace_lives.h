@@ -9,8 +9,8 @@
 namespace qn::dump
 {
 
-// Whether the file has the header of a trace file. Throws io_error.
-bool is_trace_file(const std::string &path);
+// Whether the file has the header of a trace file, or what is left of one, or that of a newer format. Throws io_error.
+bool is_meant_as_trace_file(const std::string &path);
 
 // Reads the header and the first record; findings are left to who reads the file. Throws io_error.
 void look_at(trace_source &source);

@@ -78,24 +78,23 @@ void take_folders(trace_source &source)
     const fs::path program = fs::absolute(source.path, error).lexically_normal().parent_path();
     const fs::path node = program.parent_path();
     const std::string node_id = node.filename();
-    if (node_id.size() != 16 || node_id.find_first_not_of("0123456789abcdef") != std::string::npos) return;
+    if (!is_node_folder(node_id)) return;
     source.program = program.filename();
     source.host = node.parent_path().filename();
     // The digits are all 0 where the library does not know the node either.
     if (node_id.find_first_not_of('0') != std::string::npos) source.node_id = node_id;
 }
 
-// The cluster, where all levels of a spool directory are below the folder that was named.
+// The cluster, where the folder that was named is a spool directory.
 void take_cluster(trace_source &source, const std::vector<std::string> &folders)
 {
-    constexpr std::size_t levels = 5; // cluster, cluster id, host, node id, program
-    if (folders.size() >= levels) source.cluster = folders[folders.size() - levels];
+    if (begin_with_cluster(folders)) source.cluster = folders.front();
 }
 
 class collector
 {
 public:
-    explicit collector(duplicates choice) : choice_(choice) {}
+    collector(duplicates choice, passed_over others) : choice_(choice), others_(others) {}
 
     void add(const std::string &argument)
     {
@@ -121,6 +120,7 @@ private:
         };
         const auto report = [&](const std::string &path, const std::string &why) { tell(path, why); };
         spool_tree(visit, report).walk(folder);
+        std::uint64_t others = 0;
         std::error_code error;
         for (fs::directory_iterator entry(folder, error), end; !error && entry != end; entry.increment(error)) {
             std::error_code gone;
@@ -129,7 +129,10 @@ private:
             if (source.copy) continue;
             try {
                 const bool is_page = choice_ == duplicates::kept && source.page != 0;
-                if (is_page || is_trace_file(source.path)) found.push_back(std::move(source));
+                if (is_page || is_meant_as_trace_file(source.path))
+                    found.push_back(std::move(source));
+                else
+                    ++others;
             } catch (const reader::io_error &failure) {
                 tell(source.path, failure.what());
             }
@@ -137,6 +140,9 @@ private:
         std::sort(found.begin(), found.end(),
                   [](const auto &left, const auto &right) { return left.path < right.path; });
         for (trace_source &source : found) examine(std::move(source));
+        if (others != 0 && others_ == passed_over::told)
+            write_message(fmt::format("{}: {} passed over", printable_name(folder),
+                                      others == 1 ? "1 other file was" : fmt::format("{} other files were", others)));
     }
 
     void add_trace(const std::string &path)
@@ -170,6 +176,7 @@ private:
     }
 
     duplicates choice_;
+    passed_over others_;
     trace_set set_;
 };
 
@@ -210,9 +217,9 @@ std::map<std::uint32_t, std::string> pages_of(const std::string &path)
     return pages;
 }
 
-trace_set find_traces(const std::vector<std::string> &arguments, duplicates choice)
+trace_set find_traces(const std::vector<std::string> &arguments, duplicates choice, passed_over others)
 {
-    collector collect(choice);
+    collector collect(choice, others);
     for (const auto &argument : arguments) collect.add(argument);
     trace_set set = collect.take();
     if (choice == duplicates::dropped) drop_duplicates(set.sources);

@@ -2,8 +2,9 @@
 //
 // An argument is a trace file, a page or a copy; a trace by its name, which stands for the file of that name and for
 // the pages of its page set (app.trc for app.trc and app.trc.1.sp, app.trc.2.sp, ...); or a folder, which stands for
-// all copies below it and for the trace files that lie in it. Files in a folder that are no trace files are passed
-// over.
+// all copies below it and for the trace files that lie in it. Files in a folder that nobody
+// would take for trace files are passed over, and counted on standard error; damaged ones and those of a newer format are
+// not.
 //
 // No life of a ring is read twice. A page keeps its records when they were copied, and its state does not tell whether
 // they are elsewhere: in the states 2 and 8 a copy may be in the making, and a page of the state 4 may never have been
@@ -76,7 +77,11 @@ enum class duplicates { dropped, kept };
 // The pages of the trace of that name, by their numbers.
 std::map<std::uint32_t, std::string> pages_of(const std::string &trace);
 
-trace_set find_traces(const std::vector<std::string> &arguments, duplicates choice = duplicates::dropped);
+// Whether it is told how many other files there are in a folder.
+enum class passed_over { told, untold };
+
+trace_set find_traces(const std::vector<std::string> &arguments, duplicates choice = duplicates::dropped,
+                      passed_over others = passed_over::told);
 
 // Adds FILE..., whose values go to `arguments`.
 void add_traces_option(CLI::App &command, std::vector<std::string> &arguments);

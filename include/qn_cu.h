@@ -5,11 +5,12 @@
  *
  *  - Any thread may call it at any time, before main and from exit handlers too.
  *  - None is a cancellation point: a cancelled thread finishes the call it is in. (The calls of cu_tr_proxy.h
- * are the exception, they run another library's code.) Asynchronous cancellation is not supported.
+ *    are the exception, they run another library's code.) Asynchronous cancellation is not supported.
  *  - A result of type int is 0 on success and otherwise the errno value that tells why; errno itself is not
- * part of the result. On failure an output holds nothing of use, but never garbage that would be unsafe to
- * release.
- *  - Descriptors are opened close-on-exec and closed before the function returns.
+ *    part of the result. On failure an output holds nothing of use, but never garbage that would be unsafe to
+ *    release.
+ *  - Descriptors are closed before the function returns. They are opened close-on-exec, but for the message catalogue's,
+ *    which the C library opens.
  */
 #ifndef QN_CU_H
 #define QN_CU_H
@@ -18,6 +19,8 @@
 #include <stddef.h>
 #include <sys/types.h>
 #include <time.h>
+
+struct timespec; /* which strict ISO C before C11 does not have in <time.h> */
 
 QN_BEGIN_DECLS
 
@@ -113,7 +116,8 @@ QN_EXPORT void cu_rel_error_1(cu_error_t *error);
 /*
  * Stores in *text the message of an error, with its inserts filled in; the caller releases it with free().
  *
- * The text is the catalogue's (found by NLSPATH and the locale's LC_MESSAGES) when there is one and its
+ * The text is the catalogue's (found by NLSPATH and the locale's LC_MESSAGES; without NLSPATH under /usr/share/locale
+ * alone, so that what was installed elsewhere needs it) when there is one and its
  * conversions fit the recorded inserts, otherwise cu_msg_default. A catalogue is data from outside: whatever
  * conversions it has, only recorded inserts of the right type are read. A conversion of the default text that
  * has no insert stays as it is written. A width, or the precision of a number, counts for at most 4095. The

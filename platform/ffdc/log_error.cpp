@@ -1,7 +1,9 @@
-// Filing the report of a failure: identifier, system log, record. No state of its own, no lock.
+// Filing the report of a failure: identifier, system log, record. No state of its own; the one lock is the turn to write
+// to the system log.
 #include <algorithm>
 #include <cerrno>
-#include <ctime>
+#include <chrono>
+#include <cstdio>
 #include <exception>
 #include <string>
 #include <syslog.h>
@@ -10,6 +12,7 @@
 #include <qn_ffdc.h>
 
 #include "platform/common/files.h"
+#include "platform/common/system_log.h"
 #include "platform/ffdc/failure_id.h"
 #include "platform/ffdc/record_file.h"
 #include "platform/ffdc/text.h"
@@ -49,17 +52,25 @@ void write_system_log(const failure &what)
 {
     const std::string component = one_line_or_nothing(what.component);
     const std::string text = one_line_or_nothing(what.text);
+    const platform::system_log_turn turn;
+    if (!turn) return;
     const platform::standard_numbers_taken other_numbers;
     syslog(priority_of(what.log_event), "%s: error %d: %s (failure id %s)", component.c_str(), what.error_id,
            text.c_str(), what.id);
 }
 
+// Not by gmtime_r(): a child that is forked while another thread is in there would wait for it for good.
 std::string present_time()
 {
-    const time_t now = time(nullptr);
-    tm parts{};
-    char text[32] = "";
-    if (gmtime_r(&now, &parts) != nullptr) std::strftime(text, sizeof text, "%Y-%m-%dT%H:%M:%SZ", &parts);
+    const auto now = std::chrono::floor<std::chrono::seconds>(std::chrono::system_clock::now());
+    const auto today = std::chrono::floor<std::chrono::days>(now);
+    const std::chrono::year_month_day date(today);
+    const std::chrono::hh_mm_ss time(now - today);
+    char text[64];
+    std::snprintf(text, sizeof text, "%04d-%02u-%02uT%02d:%02d:%02dZ", static_cast<int>(date.year()),
+                  static_cast<unsigned>(date.month()), static_cast<unsigned>(date.day()),
+                  static_cast<int>(time.hours().count()), static_cast<int>(time.minutes().count()),
+                  static_cast<int>(time.seconds().count()));
     return text;
 }
 

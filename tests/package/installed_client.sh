@@ -14,7 +14,8 @@ flags=()
 
 cmake --install "$build" --prefix "$prefix" >/dev/null
 libdir=$(dirname "$(find "$prefix" -name libqn_tr.so)")
-export LD_LIBRARY_PATH=$libdir PKG_CONFIG_PATH=$libdir/pkgconfig
+unset LD_LIBRARY_PATH
+export PKG_CONFIG_PATH=$libdir/pkgconfig
 
 for header in "$prefix"/include/*.h; do
     printf '#include <%s>\n' "$(basename "$header")" >"$scratch/alone.c"
@@ -41,11 +42,24 @@ sed -n '/^```c$/,/^```$/p' "$here/../../README.md" | sed '1d;$d' >"$scratch/read
 "$cc" -std=c11 -Wall -Wextra -Werror "${flags[@]}" "$scratch/readme.c" "${packaged[@]}" -o "$scratch/readme"
 
 for client in client_c client_cxx project/build/client readme; do
-    "$scratch/$client" "$scratch/trace"
+    LD_LIBRARY_PATH=$libdir "$scratch/$client" "$scratch/trace"
     "$prefix/bin/qntrace" dump "$scratch/trace" >"$scratch/text"
     grep -q client "$scratch/text"
     rm "$scratch/trace"
 done
+
+# README.md's configuration, in the environment, for the trace that its client names when it is given no name
+pattern=$(sed -n 's/^ *pat = //p' "$here/../../README.md")
+mkdir "$scratch/run"
+(cd "$scratch/run" && QN_TR_SPOOL="$pattern:ON:4:$scratch/spool" LD_LIBRARY_PATH=$libdir "$scratch/readme")
+test -s "$scratch/run/client.trc.1.sp"
+
+# Folders that are absolute
+cmake -DCMAKE_INSTALL_PREFIX=/opt/qn -DCMAKE_INSTALL_LIBDIR=/usr/lib/qn -DCMAKE_INSTALL_INCLUDEDIR=include \
+    -DFILE="$scratch/absolute/qn_tr.pc" -P "$here/pkg_config_file.cmake"
+[ "$(PKG_CONFIG_PATH=$scratch/absolute pkg-config --variable=libdir qn_tr)" = /usr/lib/qn ]
+[ "$(PKG_CONFIG_PATH=$scratch/absolute pkg-config --variable=includedir qn_tr)" = /opt/qn/include ]
+
 test -s "$prefix/share/man/man1/qntrace.1"
 test -s "$prefix/share/man/man1/qntrace-dump.1"
 test -s "$prefix/share/bash-completion/completions/qntrace"

@@ -1,8 +1,12 @@
 // Filing the report of a failure: identifier, system log, and the record in a private /var.
 #include <cerrno>
 #include <cstring>
+#include <ctime>
+#include <fcntl.h>
 #include <filesystem>
 #include <string>
+#include <sys/mount.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <syslog.h>
@@ -183,6 +187,94 @@ TEST(LogError, DoesNotFollowALink)
         EXPECT_EQ(file_report(id), ELOOP);
         EXPECT_EQ(file_bytes("/var/precious"), "mine");
         EXPECT_EQ(qn::test::system_log().size(), 1U);
+        return true;
+    }));
+}
+
+TEST(LogError, DoesNotWriteIntoAPipe)
+{
+    EXPECT_TRUE(in_private_var([] {
+        std::filesystem::create_directories(record_folder);
+        EXPECT_EQ(mkfifo("/var/qn/ffdc/trace.log", 0600), 0);
+        const int reader = open("/var/qn/ffdc/trace.log", O_RDONLY | O_NONBLOCK);
+        fc_eid_t id;
+        EXPECT_EQ(file_report(id), ENXIO);
+        char byte;
+        EXPECT_EQ(read(reader, &byte, 1), 0);
+        close(reader);
+        EXPECT_EQ(file_report(id), ENXIO);
+        return true;
+    }));
+}
+
+TEST(LogError, LeavesOutARecordBeyondTheFileSizeLimit)
+{
+    EXPECT_TRUE(in_private_var([] {
+        std::filesystem::create_directories(record_folder);
+        fc_eid_t id;
+        EXPECT_EQ(file_report(id), 0);
+        const std::string first = file_bytes("/var/qn/ffdc/trace.log");
+        const rlimit limit = {first.size() + 100, first.size() + 100};
+        EXPECT_EQ(setrlimit(RLIMIT_FSIZE, &limit), 0);
+        EXPECT_EQ(file_report(id), EFBIG);
+        EXPECT_EQ(file_bytes("/var/qn/ffdc/trace.log"), first);
+        return true;
+    }));
+}
+
+TEST(LogError, ARecordThatWasCutEndsWhereTheNextBegins)
+{
+    EXPECT_TRUE(in_private_var([] {
+        std::filesystem::create_directories(record_folder);
+        for (const std::string piece : {"i", "id: cut", "id: cut\n", "id: cut\n\n"}) {
+            qn::test::write_file("/var/qn/ffdc/trace.log", piece);
+            fc_eid_t id;
+            EXPECT_EQ(file_report(id), 0);
+            const std::string text = piece.substr(0, piece.find('\n'));
+            EXPECT_EQ(file_bytes("/var/qn/ffdc/trace.log").find(text + "\n\nid: " + id + "\n"), 0U) << piece;
+        }
+        return true;
+    }));
+}
+
+TEST(LogError, TellsWhatADiskThatFillsUpHasCut)
+{
+    EXPECT_TRUE(in_private_var([] {
+        std::filesystem::create_directories(record_folder);
+        EXPECT_EQ(mount("none", record_folder, "tmpfs", 0, "size=16k"), 0);
+        const std::string data(4000, 'a');
+        fc_eid_t id;
+        int status = 0;
+        while (status == 0)
+            status = fc_log_error_1(id, 0, "trace", nullptr, nullptr, nullptr, 0, 0, 0, 1, data.data(), 4000, nullptr,
+                                    nullptr);
+        EXPECT_EQ(status, ENOSPC);
+        const auto cut = static_cast<off_t>(std::filesystem::file_size("/var/qn/ffdc/trace.log"));
+        EXPECT_EQ(cut, 16384) << "a piece of the last record is there";
+        EXPECT_EQ(mount("none", record_folder, "tmpfs", MS_REMOUNT, "size=64k"), 0);
+        EXPECT_EQ(file_report(id), 0);
+        EXPECT_EQ(file_bytes("/var/qn/ffdc/trace.log").find(std::string("\n\nid: ") + id + "\n"),
+                  static_cast<size_t>(cut));
+        return true;
+    }));
+}
+
+TEST(LogError, TheTimeIsThatOfTheClockInUtc)
+{
+    EXPECT_TRUE(in_private_var([] {
+        std::filesystem::create_directories(record_folder);
+        setenv("TZ", "XXX-5", 1);
+        const time_t before = std::time(nullptr);
+        fc_eid_t id;
+        file_report(id);
+        const time_t after = std::time(nullptr);
+        const std::string record = file_bytes("/var/qn/ffdc/trace.log");
+        tm parts{};
+        const char *end = strptime(record.c_str() + record.find("\ntime: ") + 7, "%Y-%m-%dT%H:%M:%SZ\n", &parts);
+        if (end == nullptr) return false;
+        const time_t told = timegm(&parts);
+        EXPECT_LE(before, told);
+        EXPECT_LE(told, after);
         return true;
     }));
 }

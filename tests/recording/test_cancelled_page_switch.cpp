@@ -68,7 +68,7 @@ protected:
 } // namespace
 
 // From level 2 on a switch is logged, from level 8 on the queue too.
-INSTANTIATE_TEST_SUITE_P(At, CancelledPageSwitch, testing::Values("syslog", "vsyslog"),
+INSTANTIATE_TEST_SUITE_P(At, CancelledPageSwitch, testing::Values("vsyslog"),
                          [](const auto &info) { return std::string(info.param); });
 
 TEST_P(CancelledPageSwitch, IsDoneAsAWhole)

@@ -17,6 +17,9 @@ inline bool debug_level_above(qn_uint32_t level)
     return __builtin_expect(load_relaxed(global_debug_level) > level, 0);
 }
 
+// Writes one line, whatever the level is. A cancellation point.
+void log_line(int priority, const char *format, ...) QN_PRINTF_LIKE(2, 3);
+
 // Writes one line at priority warning when the level is above 7. A cancellation point then.
 void debug(const char *format, ...) QN_PRINTF_LIKE(1, 2);
 

@@ -5,10 +5,10 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
-#include <sys/resource.h>
 #include <sys/statvfs.h>
 #include <unistd.h>
 
+#include "platform/common/file_size_limit.h"
 #include "trace/files/debug.h"
 #include "trace/files/error_report.h"
 #include "trace/files/trace_file.h"
@@ -40,13 +40,6 @@ bool free_bytes(int fd, qn_uint64_t &bytes)
     return true;
 }
 
-// A write beyond the process's file size limit would raise SIGXFSZ, whose default is death.
-bool exceeds_file_size_limit(qn_uint64_t size)
-{
-    rlimit limit;
-    return getrlimit(RLIMIT_FSIZE, &limit) == 0 && limit.rlim_cur != RLIM_INFINITY && size > limit.rlim_cur;
-}
-
 // The disk is full: keeps what was written, in whole memory pages.
 qn_int32_t settle_for_less(int fd, qn_uint32_t page_size, int write_errno, qn_uint32_t &size)
 {
@@ -62,7 +55,7 @@ qn_int32_t settle_for_less(int fd, qn_uint32_t page_size, int write_errno, qn_ui
 // byte, also the one that completes a chunk after a short write.
 qn_int32_t write_pattern(int fd, qn_uint64_t current_size, qn_uint32_t page_size, qn_uint32_t &size)
 {
-    if (exceeds_file_size_limit(size)) return set_error_int(QN_TR_ECLEAR, 23, EFBIG);
+    if (qn::platform::exceeds_file_size_limit(size)) return set_error_int(QN_TR_ECLEAR, 23, EFBIG);
     qn_uint64_t remaining = size - current_size;
     size_t rest_of_chunk = 0;
     while (remaining > 0) {

@@ -10,6 +10,7 @@
 #include <cu_tr_proxy.h>
 
 #include "platform/common/descriptors.h"
+#include "platform/common/system_log.h"
 #include "trace/components/specifications.h"
 #include "trace/files/debug.h"
 #include "trace/files/locks.h"
@@ -95,7 +96,8 @@ int init(trace_anchor_t *anchor)
     if (value != nullptr) store_relaxed(global_debug_level, static_cast<qn_uint32_t>(std::strtoul(value, nullptr, 0)));
     if (debug_level_above(0)) {
         const qn::platform::standard_numbers_taken other_numbers;
-        openlog("opal_trace", LOG_CONS | LOG_NDELAY | LOG_PID, LOG_DAEMON);
+        const qn::platform::system_log_turn turn;
+        if (turn) openlog("opal_trace", LOG_CONS | LOG_NDELAY | LOG_PID, LOG_DAEMON);
     }
 
     value = environment("QN_TR_TRACE_LEVELS");

@@ -72,7 +72,7 @@ void touch_page(const trace_anchor_t *anchor, const trace_anchor_t *page)
     if (page->pMap == nullptr) return;
     debug("\ttrace: Load all part of the pages to bring into memory (%s)\n", anchor->fileName);
     memvar_to_visit = memvar_to_visit | read_words(page->pMap, page->pMapEnd);
-    if (debug_level_above(7)) syslog(LOG_DEBUG, "\ttrace: memvar_to_visit=0x%x\n", memvar_to_visit);
+    if (debug_level_above(7)) log_line(LOG_DEBUG, "\ttrace: memvar_to_visit=0x%x\n", memvar_to_visit);
 }
 
 // All that load_trace_pages_to_memory() does but for the error record. The result of locking the global mutex.

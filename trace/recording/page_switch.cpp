@@ -38,8 +38,8 @@ bool ring_can_be_written(trace_anchor_t *page)
 void log_switch(int priority, const char *what, trace_anchor_t *page, int flags)
 {
     if (!debug_level_above(switching_debug_level)) return;
-    syslog(priority, "%s %s (flags: %d, tid: %u, pNextPage: %p)\n", page->fileName, what, flags,
-           static_cast<unsigned>(pthread_self()), static_cast<void *>(page));
+    log_line(priority, "%s %s (flags: %d, tid: %u, pNextPage: %p)\n", page->fileName, what, flags,
+             static_cast<unsigned>(pthread_self()), static_cast<void *>(page));
 }
 
 // Counts whether what the page holds was spooled in time, and takes it back from the queue when it was not.
@@ -109,7 +109,7 @@ void write_notice(trace_anchor_t *page)
     keep_store_order();
     notice->function = static_cast<qn_uint16_t>(format::kind::page_note);
     page->pWrap = free_record;
-    if (debug_level_above(switching_debug_level)) syslog(LOG_WARNING, "%s consec %u\n", page->fileName, count);
+    if (debug_level_above(switching_debug_level)) log_line(LOG_WARNING, "%s consec %u\n", page->fileName, count);
 }
 
 void start_writing(trace_anchor_t *page)

@@ -9,8 +9,8 @@
  *  - A result of type int is 0 on success and otherwise the errno value that tells why; errno itself is not
  *    part of the result. On failure an output holds nothing of use, but never garbage that would be unsafe to
  *    release.
- *  - Descriptors are closed before the function returns. They are opened close-on-exec, but for the message catalogue's,
- *    which the C library opens.
+ *  - Descriptors are closed before the function returns. They are opened close-on-exec, but for that of the
+ *    message catalogue, which the C library opens.
  */
 #ifndef QN_CU_H
 #define QN_CU_H

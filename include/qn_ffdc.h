@@ -100,12 +100,13 @@ QN_EXPORT int fc_mk_syslog_msg_1(const fc_err_tbl_t *entry, const void *detail_d
  *
  * Any pointer may be null; what it stands for is then missing from the record. The record is text, one "key:
  * value" per line with an empty line behind it, and reaches the file by one write: records of several processes
- * do not mix. Of a record for which the disk has no room a piece may be there; the next one begins behind an empty line.
+ * do not mix. Of a record for which the disk has no room a piece may be there; the next one begins behind an empty
+ * line.
  * Only a regular file is written (ENXIO), and none beyond the process's file size limit (EFBIG). The file is created
  * with mode 0640. The identity that the application gave to openlog() stays.
  *
- * A fork waits until no thread writes to the system log, for a second at most; the child's reports are in the files alone
- * when one still does. So are those of a signal handler that interrupted the writing of a line.
+ * A fork waits until no thread writes to the system log, for a second at most; the child's reports are in the files
+ * alone when one still does. So are those of a signal handler that interrupted the writing of a line.
  *
  * Returns 0, also without the folder; the errno value when the record could not be appended (identifier and
  * system log are there all the same); ENOMEM when there is no memory, with only the identifier made.

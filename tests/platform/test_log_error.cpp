@@ -263,7 +263,7 @@ TEST(LogError, TheTimeIsThatOfTheClockInUtc)
 {
     EXPECT_TRUE(in_private_var([] {
         std::filesystem::create_directories(record_folder);
-        setenv("TZ", "XXX-5", 1);
+        setenv("TZ", "EAST-5", 1);
         const time_t before = std::time(nullptr);
         fc_eid_t id;
         file_report(id);

@@ -63,7 +63,8 @@ void add_common_options(CLI::App &app, options &all)
         ->check(CLI::IsMember(std::vector<std::string>(kinds.begin(), kinds.end())));
     app.add_option("--threads", all.threads, "that record");
     app.add_option("--idle-threads", all.idle_threads, "that do nothing");
-    app.add_option("--visit", all.visit_us, "microseconds between the records of one more thread, which are not counted");
+    app.add_option("--visit", all.visit_us,
+                   "microseconds between the records of one more thread, which are not counted");
     app.add_option("--records", all.records, "of each thread, instead of --seconds");
     app.add_option("--seconds", all.seconds, "how long records are written");
     app.add_option("--warm-up", all.warm_up, "records of each thread before the measured ones");

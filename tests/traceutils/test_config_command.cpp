@@ -192,7 +192,7 @@ TEST(ConfigCommand, EscapesNamesForTheTerminal)
 
 TEST(ConfigCommand, JsonIsSoundWhateverANameHolds)
 {
-    EXPECT_EQ(only_section_of("\x1b\xff\":\npat = /x\n")["section"], "\x1b\xEF\xBF\xBD\"");
+    EXPECT_EQ(only_section_of("\x1b\xff\":\npat = /x\n")["section"], "\x1b\xC3\xBF\"");
 }
 
 TEST(ConfigCommand, AFileWithoutSectionsIsSound)

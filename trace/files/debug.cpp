@@ -1,3 +1,4 @@
+// Debug lines in the system log. No lock but the turn to write there.
 #include "trace/files/debug.h"
 
 #include <cstdarg>
@@ -8,7 +9,7 @@ qn_uint32_t global_debug_level = 0;
 
 namespace
 {
-void write_line(int priority, const char *format, va_list args)
+[[gnu::format(printf, 2, 0)]] void write_line(int priority, const char *format, va_list args)
 {
     const qn::platform::system_log_turn turn;
     if (turn) vsyslog(priority, format, args);

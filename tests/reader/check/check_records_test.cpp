@@ -195,7 +195,7 @@ TEST(CheckRecords, ErrorTextsThatRunIntoEachOtherAreDamage)
     const auto checked = check_with([](trace_builder &file) {
         byte_string body = file.body();
         body.u32(1).u32(2).u32(3).u32(72).u32(76).u32(0).u32(0).u32(0).u32(0).u32(0).u32(0);
-        file.add(14, body.chars("func").text("file.c"));
+        file.add(14, body.chars("func").text("file.c").text("room for both"));
     });
     expect_damage(checked, "two texts of the error overlap (sequence number 6)");
 }

@@ -12,7 +12,8 @@
 //     configuration_file_last_modified_mutex
 //     cluster info mutex      the cache of the cluster's facts
 //
-// Builds for finding faults check this order (lock_ranks.h). A lock may be tried for at any time.
+// Builds for finding faults check this order (lock_ranks.h). A lock may be tried for at any time. The first two may be
+// biased towards a thread (lock_bias.h), which then writes records without the mutex.
 //
 // All of them are recursive. A guard releases its lock when it goes out of scope, also when the thread is cancelled:
 // cancellation unwinds the stack like an exception. So nothing between a guard and a cancellation point may be noexcept.

@@ -268,6 +268,48 @@ TEST_F(LockBias, LeavesNoGapWhenItsThreadTakesTheMutexToo)
     EXPECT_TRUE(is_free(anchors.anchorMutex));
 }
 
+TEST_F(LockBias, RefusesTheRecordsOfASignalHandlerWhileItsThreadIsInside)
+{
+    trace_with_bias();
+    {
+        const writer_lock inside(&anchors);
+        EXPECT_EQ(tr_record_id_1("ABCD", 0), QN_TR_ELOCK); // as a handler on this thread would
+    }
+    write(1);
+    expect_all_written();
+}
+
+TEST_F(LockBias, RefusesTheRecordsOfASignalHandlerWhenItsThreadTookTheMutexToo)
+{
+    trace_with_bias();
+    {
+        writer_lock inside(&anchors);
+        ASSERT_TRUE(inside.take_mutex());
+        EXPECT_EQ(tr_record_id_1("ABCD", 0), QN_TR_ELOCK);
+    }
+    write(1);
+    EXPECT_TRUE(is_biased());
+    expect_all_written();
+}
+
+TEST_F(LockBias, IsNotUsedWhileItsThreadIsInAGuard)
+{
+    trace();
+    while (!is_biased()) write(1);
+    {
+        const global_lock guard;
+        const writer_lock inside(&anchors);
+        EXPECT_FALSE(is_free(anchors.anchorMutex));
+    }
+    {
+        const global_lock guard;
+        EXPECT_TRUE(writer_lock(&anchors));
+        EXPECT_EQ(tr_record_id_1("ABCD", 0), QN_TR_ELOCK) << "the guard is forgotten";
+    }
+    write(1);
+    expect_all_written();
+}
+
 TEST_F(LockBias, OfOneFileLetsOthersHaveAnotherFile)
 {
     trace_with_bias();

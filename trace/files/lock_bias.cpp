@@ -23,8 +23,10 @@ bool is_allowed = false;
 // biased towards further threads.
 constinit biased_thread threads[64] = {};
 
+constinit const lock_bias no_lock = {};
+
 // The calling thread's; null when there is none left.
-biased_thread *own_mark()
+biased_thread *mark_of_this_thread()
 {
     const uintptr_t self = own_thread_pointer();
     for (biased_thread &each : threads) {
@@ -70,6 +72,9 @@ void wait(long nanoseconds)
 }
 } // namespace
 
+constinit biased_thread not_biased = {}, in_a_guard = {0, &no_lock};
+constinit thread_local biased_thread *this_thread = &not_biased;
+
 void allow_bias()
 {
 #ifndef __SANITIZE_THREAD__ // it knows nothing of that barrier
@@ -107,7 +112,7 @@ void bias_towards_holder(lock_bias &bias)
 {
     bias.times = 0;
     if (!load_relaxed(is_allowed)) return;
-    biased_thread *mark = own_mark();
+    biased_thread *mark = mark_of_this_thread();
     if (mark == nullptr) return;
     bias.holder = 0;
     store_relaxed(bias.towards, mark);

@@ -41,6 +41,12 @@ struct alignas(64) biased_thread {
     const lock_bias *inside;
 };
 
+// What the calling thread is known by: its own mark, once it has written a record by a bias; before that, `not_biased`.
+// In a guard of locks.h, `in_a_guard`, which is always inside. Nobody else reads or stores it, but for a signal handler
+// that interrupts the thread, and that leaves it as it was.
+extern constinit thread_local biased_thread *this_thread __attribute__((tls_model("initial-exec")));
+extern biased_thread not_biased, in_a_guard;
+
 struct lock_bias {
     biased_thread *towards; // null: nobody. Every writer reads it without the mutex
     biased_thread *leaving; // was inside when the bias was revoked
@@ -65,12 +71,15 @@ void allow_bias();
 // In a forked child no other thread is inside of anything.
 void forget_biased_threads();
 
-// Enters without the mutex; null when the lock is not biased towards the calling thread.
-[[gnu::always_inline]] inline biased_thread *enter_biased(pthread_mutex_t *mutex)
+// Enters without the mutex; null when the lock is not biased towards the calling thread, which is given.
+[[gnu::always_inline]] inline biased_thread *enter_biased(pthread_mutex_t *mutex, biased_thread *self)
 {
     const lock_bias &bias = bias_of(mutex);
-    biased_thread *self = load_relaxed(bias.towards);
-    if (self == nullptr || self->thread != own_thread_pointer()) return nullptr;
+    biased_thread *towards = load_relaxed(bias.towards);
+    if (__builtin_expect(towards != self, 0)) {
+        if (self != &not_biased || towards == nullptr || towards->thread != own_thread_pointer()) return nullptr;
+        this_thread = self = towards; // the first time
+    }
     store_release(self->inside, &bias); // who waits for it to leave another lock sees all that it did there
     std::atomic_signal_fence(std::memory_order_seq_cst);
     if (__builtin_expect(load_relaxed(bias.towards) == self, 1)) return self;

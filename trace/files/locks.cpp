@@ -40,8 +40,6 @@ void cleanup_anchor_set(void *anchor) { unlock_anchor_set(static_cast<trace_anch
 
 namespace qn::tr
 {
-constinit thread_local int guards_of_thread = 0;
-
 int lock_busy_mutex(pthread_mutex_t *mutex, int result_of_try)
 {
     if (result_of_try != EBUSY) return result_of_try;

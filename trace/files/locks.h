@@ -59,34 +59,35 @@ extern pthread_mutex_t cluster_info_mutex;
 
 namespace qn::tr
 {
-// How many guards the calling thread is inside of. Only the thread itself changes it; a signal handler that interrupts it
-// leaves it as it was.
-extern constinit thread_local int guards_of_thread __attribute__((tls_model("initial-exec")));
+// What every guard begins and ends with: tells a signal handler on the same thread that a lock is held, or just being taken
+// or released. The locks are recursive and would let the handler in, amid what the thread is doing.
+inline biased_thread *enter_guard()
+{
+    biased_thread *before = this_thread;
+    this_thread = &in_a_guard;
+    std::atomic_signal_fence(std::memory_order_seq_cst);
+    return before;
+}
+[[gnu::always_inline]] inline void leave_guard(biased_thread *before)
+{
+    std::atomic_signal_fence(std::memory_order_seq_cst);
+    this_thread = before;
+}
 
-// Part of every guard: tells a signal handler on the same thread that a lock is held, or just being taken or released.
-// The locks are recursive and would let the handler in, amid what the thread is doing.
 class guard_mark
 {
 public:
-    guard_mark() : before_(guards_of_thread)
-    {
-        guards_of_thread = before_ + 1;
-        std::atomic_signal_fence(std::memory_order_seq_cst);
-    }
+    guard_mark() = default;
     guard_mark(const guard_mark &) = delete;
     guard_mark &operator=(const guard_mark &) = delete;
-    [[gnu::always_inline]] ~guard_mark()
-    {
-        std::atomic_signal_fence(std::memory_order_seq_cst);
-        guards_of_thread = before_;
-    }
+    [[gnu::always_inline]] ~guard_mark() { leave_guard(before_); }
 
 private:
-    int before_;
+    biased_thread *before_ = enter_guard();
 };
 
-// Whether the caller interrupts the library on its own thread.
-inline bool interrupts_a_guard() { return guards_of_thread != 0; }
+// Whether the caller, the given thread, interrupts the library: in a guard, or inside by a bias.
+inline bool interrupts_a_guard(const biased_thread *self) { return self->inside != nullptr; }
 
 // The locks under which records are written may be biased towards a thread.
 constexpr bool may_be_biased(lock_rank rank) { return rank <= lock_rank::set; }
@@ -261,17 +262,18 @@ private:
     pthread_mutex_t *mutex_;
 };
 
-// Holds an anchor set lock to write a record: by a bias, or else by the mutex.
+// Holds an anchor set lock to write a record: by a bias, or else by the mutex, and then in a guard.
 class writer_lock
 {
 public:
-    [[gnu::always_inline]] explicit writer_lock(trace_anchor_t *anchor)
-        : mutex_(anchor_set_mutex(anchor)), biased_(enter_biased(mutex_))
+    [[gnu::always_inline]] explicit writer_lock(trace_anchor_t *anchor, biased_thread *self = this_thread)
+        : mutex_(anchor_set_mutex(anchor)), biased_(enter_biased(mutex_, self))
     {
         if (__builtin_expect(biased_ != nullptr, 1)) {
             note_taken(mutex_, rank_of_set_mutex(anchor, mutex_));
             return;
         }
+        before_ = enter_guard();
         int result = 0;
         mutex_ = take_if_right(anchor, mutex_, result);
         if (__builtin_expect(mutex_ == nullptr && result == 0, 0)) mutex_ = take_anchor_set(anchor, result);
@@ -283,9 +285,10 @@ public:
         if (__builtin_expect(biased_ != nullptr, 1)) {
             note_released(mutex_);
             leave_biased(biased_);
-        } else if (mutex_ != nullptr) {
-            unlock_mutex(mutex_);
+            return;
         }
+        if (mutex_ != nullptr) unlock_mutex(mutex_);
+        leave_guard(before_);
     }
     explicit operator bool() const { return mutex_ != nullptr; }
 
@@ -293,16 +296,20 @@ public:
     bool take_mutex()
     {
         if (biased_ == nullptr) return true;
-        if (pthread_mutex_lock(mutex_) != 0) return false;
+        before_ = enter_guard();
+        if (pthread_mutex_lock(mutex_) != 0) {
+            leave_guard(before_);
+            return false;
+        }
         leave_biased(biased_);
         biased_ = nullptr;
         return true;
     }
 
 private:
-    guard_mark mark_;
     pthread_mutex_t *mutex_;
     biased_thread *biased_;
+    biased_thread *before_;
 };
 
 // Holds the lock of the page set that a single file may become. Binding the file to a specification makes that one its set

@@ -63,8 +63,9 @@ template <class Writer>
     qn_int32_t status = writer.check(anchor);
     if (status != 0) return status == nothing_to_write ? 0 : status;
 
-    if (interrupts_a_guard()) return QN_TR_ELOCK;
-    writer_lock set(anchor);
+    biased_thread *self = this_thread;
+    if (interrupts_a_guard(self)) return QN_TR_ELOCK;
+    writer_lock set(anchor, self);
     if (__builtin_expect(!set, 0)) return QN_TR_ELOCK;
     status = writer.check_locked(anchor);
     // Not even the fixed part fits: the trace is not active, or its ring is tiny.

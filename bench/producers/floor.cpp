@@ -5,6 +5,9 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <memory>
+#include <string>
+#include <vector>
 
 #include <fcntl.h>
 #include <pthread.h>
@@ -27,9 +30,7 @@ constexpr std::size_t record_bytes = K == kind::id          ? 32
 class floor_ring
 {
 public:
-    static void add_options(CLI::App &, options &) {}
-
-    explicit floor_ring(const options &all) : size_(all.ring)
+    floor_ring(const std::string &file, std::size_t bytes) : size_(bytes)
     {
         pthread_mutexattr_t attributes;
         pthread_mutexattr_init(&attributes);
@@ -37,7 +38,7 @@ public:
         pthread_mutex_init(&mutex_, &attributes);
         pthread_mutexattr_destroy(&attributes);
 
-        const int fd = open((all.folder + "/floor").c_str(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
+        const int fd = open(file.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
         if (fd == -1 || posix_fallocate(fd, 0, static_cast<off_t>(size_)) != 0) fail();
         void *map = mmap(nullptr, size_, PROT_READ | PROT_WRITE, MAP_SHARED, fd, 0);
         if (map == MAP_FAILED) fail();
@@ -49,7 +50,7 @@ public:
     ~floor_ring() { munmap(map_, size_); }
 
     template <kind K>
-    void write(unsigned)
+    void write()
     {
         if constexpr (K == kind::disabled) {
             asm volatile("" ::: "memory");
@@ -95,6 +96,31 @@ private:
     std::size_t size_;
     std::size_t next_ = 0;
 };
+
+class floor_system
+{
+public:
+    static void add_options(CLI::App &app, options &all)
+    {
+        app.add_option("--files", all.files, "rings that the threads are spread over");
+    }
+
+    explicit floor_system(const options &all) : several_(all.files > 1)
+    {
+        for (unsigned i = 0; i < all.files; ++i)
+            rings_.push_back(std::make_unique<floor_ring>(all.folder + "/floor" + std::to_string(i), all.ring));
+    }
+
+    template <kind K>
+    void write(unsigned thread)
+    {
+        rings_[several_ ? thread % rings_.size() : 0]->template write<K>();
+    }
+
+private:
+    std::vector<std::unique_ptr<floor_ring>> rings_;
+    bool several_;
+};
 } // namespace
 
-int main(int argc, char **argv) { return produce<floor_ring>(argc, argv); }
+int main(int argc, char **argv) { return produce<floor_system>(argc, argv); }

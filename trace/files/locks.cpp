@@ -43,10 +43,9 @@ namespace qn::tr
 int lock_busy_mutex(pthread_mutex_t *mutex, int result_of_try)
 {
     if (result_of_try != EBUSY) return result_of_try;
-    // Twice as long, and more records are written in all, but some wait longer than if all had slept at once.
-    constexpr int first_pauses = 12;
-    constexpr int last_pauses = 48;
-    for (int pauses = first_pauses; pauses <= last_pauses; pauses *= 2) {
+    // Less, and fewer records are written in all; more, and some wait longer than if all had slept at once.
+    constexpr int pauses_before_tries[] = {24, 48, 48};
+    for (const int pauses : pauses_before_tries) {
         for (int i = 0; i < pauses; ++i) __builtin_ia32_pause();
         const int result = pthread_mutex_trylock(mutex);
         if (result != EBUSY) return result;

@@ -18,6 +18,8 @@
 #include <optional>
 #include <sys/timex.h>
 
+#include <qn_cu.h>
+
 #include "platform/cu/clock_pair.h"
 #include "platform/cu/counter.h"
 #include "platform/cu/frequency_hints.h"
@@ -40,6 +42,10 @@ struct load_time {
 };
 constinit load_time at_load{};
 constinit std::atomic<bool> load_time_is_useful{false};
+
+// In ticks, the line that was looked at last: one that is not twice as long tells little more. Every page of a trace asks
+// for the rate.
+constinit std::atomic<uint64_t> seen_line{0};
 
 int64_t clock_ns(clockid_t clock)
 {
@@ -67,14 +73,23 @@ double measured_rate()
     return rate_by_slope(look_at_counter);
 }
 
-// From the load of the library to now; nothing when that is too short or does not tell.
+uint64_t ticks_since_load()
+{
+    qn_uint64_t now = 0;
+    cu_get_ctr_1(&now);
+    return now - at_load.pair.counter;
+}
+
+// From the load of the library to now; nothing when that is too short, tells nothing new, or nothing at all.
 std::optional<slope> line_since_load()
 {
     clock_pair now;
     if (!load_time_is_useful.load(std::memory_order_acquire)) return std::nullopt;
+    if (ticks_since_load() / 2 < seen_line.load(std::memory_order_relaxed)) return std::nullopt;
     if (read_narrow_pair(CLOCK_MONOTONIC_RAW, &now) != 0) return std::nullopt;
     if (now.ns - at_load.pair.ns < shortest_line_ns) return std::nullopt;
     if (std::abs(suspended_ns() - at_load.suspended_ns) > suspend_ns) return std::nullopt;
+    seen_line.store(now.counter - at_load.pair.counter, std::memory_order_relaxed);
     return slope_between(at_load.pair, now);
 }
 } // namespace

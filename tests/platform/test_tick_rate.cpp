@@ -1,7 +1,10 @@
 // How fast the counter runs: the kernel's possible rates, the hints, the steering of the clock.
 #include "platform/cu/tick_rate.h"
 
+#include <atomic>
+#include <chrono>
 #include <cmath>
+#include <ctime>
 #include <thread>
 #include <vector>
 
@@ -9,8 +12,22 @@
 
 #include "instrumented.h"
 #include "platform/cu/clock_pair.h"
+#include "platform/cu/counter.h"
 #include "platform/cu/frequency_hints.h"
 #include "platform/cu/kernel_rate.h"
+
+namespace
+{
+std::atomic<int> raw_clock_readings{0};
+}
+
+// As the linker names what the library calls, and the real one.
+extern "C" int __real_clock_gettime(clockid_t clock, timespec *time);
+extern "C" int __wrap_clock_gettime(clockid_t clock, timespec *time)
+{
+    if (clock == CLOCK_MONOTONIC_RAW) ++raw_clock_readings;
+    return __real_clock_gettime(clock, time);
+}
 
 namespace
 {
@@ -117,6 +134,23 @@ TEST(TickRate, ThreadsThatMeasureTogetherAgree)
     for (double &rate : rates) threads.emplace_back([&rate] { rate = ticks_per_second(); });
     for (std::thread &thread : threads) thread.join();
     for (const double rate : rates) EXPECT_LT(distance(rate, rates[0]), tolerance);
+}
+
+TEST(TickRate, IsComparedWithTheLineSinceTheLoadWhenThatIsTwiceAsLong)
+{
+    if (source_of_counter() == counter_source::monotonic_clock) GTEST_SKIP() << "its rate is known";
+    const auto compares = [] {
+        const int before = raw_clock_readings;
+        ticks_per_second();
+        return raw_clock_readings != before;
+    };
+    const auto wait_until_it_compares = [&] {
+        while (!compares()) std::this_thread::sleep_for(std::chrono::milliseconds(20));
+    };
+    std::this_thread::sleep_for(std::chrono::milliseconds(400)); // so much older it will not be at once
+    wait_until_it_compares();
+    EXPECT_FALSE(compares());
+    wait_until_it_compares();
 }
 
 TEST(TickRate, StaysPutOnceItIsRight)

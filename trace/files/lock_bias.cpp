@@ -3,10 +3,11 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <ctime>
 #include <linux/membarrier.h>
 #include <sys/syscall.h>
 #include <unistd.h>
+
+#include "trace/files/deadline.h"
 
 namespace qn::tr
 {
@@ -62,11 +63,7 @@ bool membarrier(int command)
 void wait(long nanoseconds)
 {
     const errno_kept of_caller;
-    timespec end{};
-    clock_gettime(CLOCK_MONOTONIC, &end);
-    end.tv_nsec += nanoseconds;
-    end.tv_sec += end.tv_nsec / 1000000000;
-    end.tv_nsec %= 1000000000;
+    const timespec end = monotonic_deadline(nanoseconds);
     while (syscall(SYS_clock_nanosleep, CLOCK_MONOTONIC, TIMER_ABSTIME, &end, nullptr) != 0 && errno == EINTR) {
     }
 }

@@ -16,6 +16,7 @@
 #include <unistd.h>
 
 #include "platform/common/descriptors.h"
+#include "trace/files/deadline.h"
 #include "trace/files/debug.h"
 #include "trace/files/library.h"
 #include "trace/files/locks.h"
@@ -143,12 +144,7 @@ bool handle_page(trace_anchor_t *page)
 // in its hands. By a clock that nobody sets.
 void wait_a_moment()
 {
-    constexpr long wait_ns = 1000000;
-    timespec deadline{};
-    clock_gettime(CLOCK_MONOTONIC, &deadline);
-    deadline.tv_nsec += wait_ns;
-    deadline.tv_sec += deadline.tv_nsec / 1000000000;
-    deadline.tv_nsec %= 1000000000;
+    const timespec deadline = monotonic_deadline(1000000);
     pthread_cond_clockwait(&spq.cond, &spq.mutex, CLOCK_MONOTONIC, &deadline);
 }
 

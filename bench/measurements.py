@@ -127,8 +127,7 @@ def contention(build, rounds):
             # In one second the scheduler may give four threads on two processors rather different shares.
             timed = in_turns(rounds, {system.name: lambda system=system: fairness(system.measure(
                 "--threads", threads, "--seconds", 3)) for system in compared})
-            single = in_turns(rounds, {system.name: lambda system=system: system.measure(
-                "--threads", threads, "--latency") for system in compared[:2]})
+            single = closely(rounds, compared, "--threads", threads, "--latency")
             for name in timed:
                 rows.append([threads, name, median(timed[name], "throughput"),
                              ratio(timed[name], timed["floor"], "throughput"), median(timed[name], "fair")])
@@ -199,9 +198,8 @@ def cliffs(build, rounds):
     ring = 64 * MIB
     rows = []
     for name, warm_up in (("first", 0), ("later", passes(ring))):
-        timed = in_turns(rounds, {system.name: lambda system=system: system.measure(
-            "--ring", ring, "--warm-up", warm_up, "--records", ring // (RECORD_BYTES + 8), "--latency")
-            for system in compared})
+        timed = closely(rounds, compared, "--ring", ring, "--warm-up", warm_up, "--records",
+                        ring // (RECORD_BYTES + 8), "--latency")
         for system in compared:
             rows.append([name, system.name] + [median(timed[system.name], p) for p in ("p50", "p99", "p99.9", "p99.99")])
     yield table("first_pass", "The first pass over a file of 64 MiB, and later ones",

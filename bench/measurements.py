@@ -196,14 +196,13 @@ def cliffs(build, rounds):
     yield table("cliffs", "What else there is", ["with", "floor ns", "libqn_tr ns", "of the floor"], rows)
 
     ring = 64 * MIB
-    rows = []
-    for name, warm_up in (("first", 0), ("later", passes(ring))):
-        timed = closely(rounds, compared, "--ring", ring, "--warm-up", warm_up, "--records",
-                        ring // (RECORD_BYTES + 8), "--latency")
-        for system in compared:
-            rows.append([name, system.name] + [median(timed[system.name], p) for p in ("p50", "p99", "p99.9", "p99.99")])
+    timed = in_turns(4 * rounds, {(name, system.name): lambda system=system, warm_up=warm_up: system.measure(
+        "--ring", ring, "--warm-up", warm_up, "--records", ring // (RECORD_BYTES + 8), "--latency")
+        for system in compared for name, warm_up in (("first", 0), ("later", passes(ring)))})
+    rows = [[name, system] + [median(results, p) for p in ("p50", "p99", "p99.9", "p99.99")] +
+            [ratio(results, timed["later", system], "p99.9")] for (name, system), results in timed.items()]
     yield table("first_pass", "The first pass over a file of 64 MiB, and later ones",
-                ["pass", "system", "p50 ns", "p99 ns", "p99.9 ns", "p99.99 ns"], rows)
+                ["pass", "system", "p50 ns", "p99 ns", "p99.9 ns", "p99.99 ns", "p99.9 of later ones'"], rows)
 
 
 def write_back(build, rounds):
@@ -248,19 +247,20 @@ def page_sets(build, rounds):
     page_bytes, pages, warm_up = 256 * 1024, 32, 20_000
     burst = page_bytes // RECORD_BYTES // 4
 
-    def run(pause, *options):
+    def run(pause, seconds, *options):
         with Scratch() as folder:
             result = library.run(folder, "--ring", pages * page_bytes, "--warm-up", warm_up, "--burst", burst,
-                                 "--pause", pause, "--seconds", 2, *options)
+                                 "--pause", pause, "--seconds", seconds, *options)
             if "--pages" in options:
                 result["lost"] = result["records"] + warm_up - library.survivors(folder)
             return result
 
     rows = []
     for pause in (500, 5_000):
-        timed = in_turns(rounds, {"single file": lambda: run(pause), "page set": lambda: run(pause, "--pages", pages)})
-        single = in_turns(rounds, {"single file": lambda: run(pause, "--latency"),
-                                   "page set": lambda: run(pause, "--pages", pages, "--latency")})
+        timed = in_turns(4 * rounds, {"single file": lambda: run(pause, 0.5),
+                                      "page set": lambda: run(pause, 0.5, "--pages", pages)})
+        single = in_turns(rounds, {"single file": lambda: run(pause, 2, "--latency"),
+                                   "page set": lambda: run(pause, 2, "--pages", pages, "--latency")})
         for name in timed:
             lost = max((result["lost"] for result in timed[name] + single[name] if "lost" in result), default=None)
             rows.append([f"a quarter of a page, {pause / 1000:g} ms", name, median(timed[name], "ns"),

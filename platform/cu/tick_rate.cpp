@@ -73,6 +73,13 @@ double measured_rate()
     return rate_by_slope(look_at_counter);
 }
 
+double present_clock_speed()
+{
+    timex state{};
+    if (adjtimex(&state) < 0 || state.tick == 0) return 1;
+    return clock_speed(state.freq, state.tick);
+}
+
 uint64_t ticks_since_load()
 {
     qn_uint64_t now = 0;
@@ -116,10 +123,18 @@ double clock_speed(long freq, long tick)
     return (tick_us + freq_us) / 1e6;
 }
 
-double present_clock_speed()
+double recent_clock_speed(double ticks_per_second)
 {
-    timex state{};
-    if (adjtimex(&state) < 0 || state.tick == 0) return 1;
-    return clock_speed(state.freq, state.tick);
+    static constinit std::atomic<double> speed{0};
+    static constinit std::atomic<uint64_t> asked{0}; // a counter value
+    qn_uint64_t now = 0;
+    cu_get_ctr_1(&now);
+    double recent = speed.load(std::memory_order_relaxed);
+    const auto age = static_cast<double>(now - asked.load(std::memory_order_relaxed));
+    if (recent != 0 && age < ticks_per_second) return recent;
+    recent = present_clock_speed();
+    speed.store(recent, std::memory_order_relaxed);
+    asked.store(now, std::memory_order_relaxed);
+    return recent;
 }
 } // namespace qn::cu

@@ -32,7 +32,8 @@ wide elapsed_ns(uint64_t counter, uint64_t ticks_per_second)
 uint64_t real_tick_rate()
 {
     if (source_of_counter() == counter_source::monotonic_clock) return 1'000'000'000;
-    return static_cast<uint64_t>(std::llround(ticks_per_second() / present_clock_speed()));
+    const double ticks = ticks_per_second();
+    return static_cast<uint64_t>(std::llround(ticks / recent_clock_speed(ticks)));
 }
 
 int make_time_base(cu_timeinfo_t *timeinfo)

@@ -8,6 +8,8 @@
 #include <thread>
 #include <vector>
 
+#include <sys/timex.h>
+
 #include <gtest/gtest.h>
 
 #include "instrumented.h"
@@ -18,7 +20,7 @@
 
 namespace
 {
-std::atomic<int> raw_clock_readings{0};
+std::atomic<int> raw_clock_readings{0}, questions_for_steering{0};
 }
 
 // As the linker names what the library calls, and the real one.
@@ -27,6 +29,13 @@ extern "C" int __wrap_clock_gettime(clockid_t clock, timespec *time)
 {
     if (clock == CLOCK_MONOTONIC_RAW) ++raw_clock_readings;
     return __real_clock_gettime(clock, time);
+}
+
+extern "C" int __real_adjtimex(timex *state);
+extern "C" int __wrap_adjtimex(timex *state)
+{
+    ++questions_for_steering;
+    return __real_adjtimex(state);
 }
 
 namespace
@@ -112,6 +121,20 @@ TEST(ClockSpeed, FollowsFrequencyAndTick)
     EXPECT_NEAR(clock_speed(65536, 10'000), 1 + 1e-6, 1e-15);
     EXPECT_NEAR(clock_speed(-65536 * 500, 10'000), 1 - 500e-6, 1e-15);
     EXPECT_NEAR(clock_speed(0, 10'001), 1 + 1e-4, 1e-15);
+}
+
+TEST(ClockSpeed, IsAskedForOnceASecond)
+{
+    const double rate = ticks_per_second();
+    const auto asks = [rate] {
+        const int before = questions_for_steering;
+        recent_clock_speed(rate);
+        return questions_for_steering != before;
+    };
+    asks();
+    std::this_thread::sleep_for(std::chrono::milliseconds(1100));
+    EXPECT_TRUE(asks());
+    EXPECT_FALSE(asks());
 }
 
 TEST(TickRate, IsTheRateOfTheUnsteeredClock)

@@ -47,18 +47,13 @@ class System:
         return 0.0
 
     def run(self, folder, *options, wrapper=()):
-        """Runs the producer; its result, with the CPU time of the whole process in "process_seconds"."""
+        """Runs the producer; its result."""
         command = [*map(str, wrapper), *map(str, self.command), str(folder), *self.options, *map(str, options)]
-        with tempfile.TemporaryFile() as output:
-            process = subprocess.Popen(command, env=self.environment, stdout=output, stderr=subprocess.DEVNULL)
-            _, status, used = os.wait4(process.pid, 0)
-            process.returncode = status
-            if status not in (0, signal.SIGKILL):
-                raise RuntimeError(f"{' '.join(command)} ended with {status}")
-            output.seek(0)
-            result = json.loads(output.read())
-        result["process_seconds"] = used.ru_utime + used.ru_stime
-        return result
+        ended = subprocess.run(command, env=self.environment, stdout=subprocess.PIPE, stderr=subprocess.DEVNULL,
+                               check=False)
+        if ended.returncode not in (0, -signal.SIGKILL):
+            raise RuntimeError(f"{' '.join(command)} ended with {ended.returncode}")
+        return json.loads(ended.stdout)
 
     def measure(self, *options):
         with Scratch() as folder:

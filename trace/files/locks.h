@@ -267,13 +267,13 @@ class writer_lock
 {
 public:
     [[gnu::always_inline]] explicit writer_lock(trace_anchor_t *anchor, biased_thread *self = this_thread)
-        : mutex_(anchor_set_mutex(anchor)), biased_(enter_biased(mutex_, self))
+        : mutex_(anchor_set_mutex(anchor)), biased_(enter_biased(mutex_, self)), before_(self)
     {
         if (__builtin_expect(biased_ != nullptr, 1)) {
             note_taken(mutex_, rank_of_set_mutex(anchor, mutex_));
             return;
         }
-        before_ = enter_guard();
+        enter_guard();
         int result = 0;
         mutex_ = take_if_right(anchor, mutex_, result);
         if (__builtin_expect(mutex_ == nullptr && result == 0, 0)) mutex_ = take_anchor_set(anchor, result);
@@ -309,7 +309,7 @@ public:
 private:
     pthread_mutex_t *mutex_;
     biased_thread *biased_;
-    biased_thread *before_;
+    biased_thread *before_; // the guard, if it is in one
 };
 
 // Holds the lock of the page set that a single file may become. Binding the file to a specification makes that one its set

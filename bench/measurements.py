@@ -257,9 +257,9 @@ def page_sets(build, rounds):
             return result
 
     rows = []
-    for pause in (500, 5_000):
-        timed = in_turns(4 * rounds, {"single file": lambda: run(pause, 0.5),
-                                      "page set": lambda: run(pause, 0.5, "--pages", pages)})
+    for pause, seconds in ((500, 0.5), (5_000, 2)): # the more pauses, the longer until as many pages are full
+        timed = in_turns(4 * rounds, {"single file": lambda: run(pause, seconds),
+                                      "page set": lambda: run(pause, seconds, "--pages", pages)})
         single = in_turns(rounds, {"single file": lambda: run(pause, 2, "--latency"),
                                    "page set": lambda: run(pause, 2, "--pages", pages, "--latency")})
         for name in timed:

@@ -109,7 +109,7 @@ int append_pair(Node *&first, Node *&last, const pattern_pair &pair)
 }
 
 // Calls apply(component, i) for every category i that a node's patterns match, of all components on the anchor's list or
-// of `target` alone. Patterns that do not compile match nothing: the result is false. Compiling is most of the work: the
+// of `target` alone, which is on that list. Patterns that do not compile match nothing: the result is false. Compiling is most of the work: the
 // pattern for categories is compiled when a component matches, which of many specifications most do not.
 template <class Node, class Apply>
 bool for_each_match(const trace_anchor_t *anchor, const Node *node, component_anchor_t *target, Apply apply)
@@ -117,8 +117,8 @@ bool for_each_match(const trace_anchor_t *anchor, const Node *node, component_an
     const compiled_pattern component_pattern(node->pCompId);
     if (!component_pattern) return false;
     std::optional<compiled_pattern> category_pattern;
-    for (component_anchor_t *component = anchor->pFirstComp; component != nullptr; component = component->pNext) {
-        if (target != nullptr && component != target) continue;
+    for (component_anchor_t *component = target != nullptr ? target : anchor->pFirstComp; component != nullptr;
+         component = target != nullptr ? nullptr : component->pNext) {
         if (!component_pattern.matches(component->compId)) continue;
         if (!category_pattern) category_pattern.emplace(node->pCategory);
         if (!*category_pattern) return false;

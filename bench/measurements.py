@@ -257,7 +257,7 @@ def page_sets(build, rounds):
             return result
 
     rows = []
-    for pause, seconds in ((500, 0.5), (5_000, 2)): # a longer pause, longer until as many pages are full
+    for pause, seconds in ((500, 0.5), (5_000, 2)):  # a longer pause, longer until as many pages are full
         timed = in_turns(4 * rounds, {"single file": lambda: run(pause, seconds),
                                       "page set": lambda: run(pause, seconds, "--pages", pages)})
         single = in_turns(rounds, {"single file": lambda: run(pause, 2, "--latency"),

@@ -152,12 +152,12 @@ QN_EXPORT void cu_get_ctr_1(qn_uint64_t *ctr);
  * The first call of a process measures the rate: 0.4 ms where the thread keeps the processor, a little more than 1 ms
  * where nothing but the measurement tells. A thread that loses the processor meanwhile measures again, so on a busy
  * machine one call in ten takes some 5 ms, one in a hundred 15 ms, and there is no upper bound. Later calls take a few
- * microseconds; now and then they compare the rate with the time since the library was loaded, and correct it.
+ * microseconds; now and then they check the rate by the time since the library was loaded, and correct it if need be.
  *
  * Times converted with the result stay within 1 microsecond of CLOCK_REALTIME for a minute and more, for counters from
- * before the call too, if the clock is not set meanwhile and its discipline (adjtimex) is the same as a second ago. Where
- * the kernel does not keep time by the counter itself, the rate is as good as its measurement: 1e-8, on a busy machine
- * 5e-8, which is 3 microseconds in a minute.
+ * before the call too, as long as the clock is not set and its discipline (adjtimex) is not changed, from a second
+ * before the call on. Where the kernel does not keep time by the counter itself, the rate is as good as its measurement:
+ * 1e-8, on a busy machine 5e-8, which is 3 microseconds in a minute.
  *
  * Returns 0, EINVAL when timeinfo is null, or the error of the clock.
  */

@@ -95,8 +95,8 @@ std::optional<slope> line_since_load()
     if (ticks_since_load() / 2 < seen_line.load(std::memory_order_relaxed)) return std::nullopt;
     if (read_narrow_pair(CLOCK_MONOTONIC_RAW, &now) != 0) return std::nullopt;
     if (now.ns - at_load.pair.ns < shortest_line_ns) return std::nullopt;
-    if (std::abs(suspended_ns() - at_load.suspended_ns) > suspend_ns) return std::nullopt;
     seen_line.store(now.counter - at_load.pair.counter, std::memory_order_relaxed);
+    if (std::abs(suspended_ns() - at_load.suspended_ns) > suspend_ns) return std::nullopt;
     return slope_between(at_load.pair, now);
 }
 } // namespace

@@ -109,8 +109,9 @@ int append_pair(Node *&first, Node *&last, const pattern_pair &pair)
 }
 
 // Calls apply(component, i) for every category i that a node's patterns match, of all components on the anchor's list or
-// of `target` alone, which is on that list. Patterns that do not compile match nothing: the result is false. Compiling is most of the work: the
-// pattern for categories is compiled when a component matches, which of many specifications most do not.
+// of `target` alone, which is on that list. Patterns that do not compile match nothing: the result is false. Compiling is
+// most of the work: the pattern for categories is compiled when a component matches, which of many specifications most do
+// not.
 template <class Node, class Apply>
 bool for_each_match(const trace_anchor_t *anchor, const Node *node, component_anchor_t *target, Apply apply)
 {

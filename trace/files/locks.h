@@ -309,7 +309,7 @@ public:
 private:
     pthread_mutex_t *mutex_;
     biased_thread *biased_;
-    biased_thread *before_; // the guard, if it is in one
+    biased_thread *before_; // what the guard's end restores, if it is in one
 };
 
 // Holds the lock of the page set that a single file may become. Binding the file to a specification makes that one its set

@@ -156,8 +156,8 @@ QN_EXPORT void cu_get_ctr_1(qn_uint64_t *ctr);
  *
  * Times converted with the result stay within 1 microsecond of CLOCK_REALTIME for a minute and more, for counters from
  * before the call too, as long as the clock is not set and its discipline (adjtimex) is not changed, from a second
- * before the call on. Where the kernel does not keep time by the counter itself, the rate is as good as its measurement:
- * 1e-8, on a busy machine 5e-8, which is 3 microseconds in a minute.
+ * before the call on. Where the kernel does not keep time by the counter itself, the rate is as good as its
+ * measurement: 1e-8, on a busy machine 5e-8, which is 3 microseconds in a minute.
  *
  * Returns 0, EINVAL when timeinfo is null, or the error of the clock.
  */
